@@ -1,0 +1,29 @@
+#include "dataset/olm_zoneinfo.h"
+
+#include <err.h>
+
+#include "dataset/first_word.h"
+#include "fs/file_operations.h"
+
+olm_zoneinfo::olm_zoneinfo() : olm_zoneinfo(std::string()) {}
+
+olm_zoneinfo::olm_zoneinfo(const std::string& path)
+    : olm_dataset_component(path),
+      directory(path.empty() ? system_zoneinfo_directory : path + "/zoneinfo") {
+  read_version();
+}
+
+void olm_zoneinfo::read_version() { version_text = read_first_word(directory + "/+VERSION"); }
+
+std::string olm_zoneinfo::get_version_text() const { return version_text; }
+
+bool olm_zoneinfo::compatible_schema(const olm_dataset_component& /*other*/) const { return true; }
+
+void olm_zoneinfo::install_link() const {
+  try {
+    fs::remove(zoneinfo_link);
+  } catch (...) {
+    warn("Unlink of zoneinfo softlink failed");
+  }
+  fs::create_symlink(directory, zoneinfo_link);
+}
