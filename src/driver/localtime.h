@@ -1,0 +1,9 @@
+#pragma once
+
+// Makes sure that /var/db/timezone/localtime, the device's local zone, goes through the zoneinfo
+// link, so that it follows whichever data set is in use. A link that does is left alone, whether or
+// not its zone exists. One into the system's own zone files is corrected, if the zone exists in the
+// data set in use: prints "Correcting localtime link to ...". Anything else becomes a link to the
+// default zone: prints "localtime link invalid; resetting to ...".
+// Throws errno when the link to the default zone cannot be made; the link is then missing.
+void repair_localtime_link();
