@@ -1,0 +1,138 @@
+#include "testbed/device.h"
+
+#include <sys/mman.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <stdexcept>
+#include <string_view>
+
+#include "testbed/private_root.h"
+
+namespace {
+
+namespace files = std::filesystem;
+
+// As warn prints it.
+constexpr std::string_view program_name = "tzdata-select: ";
+
+std::string read(const files::path& file) {
+  return (std::ostringstream() << std::ifstream(file).rdbuf()).str();
+}
+
+std::vector<std::string> split_lines(const std::string& text) {
+  std::istringstream stream(text);
+  std::vector<std::string> lines;
+  for (std::string line; std::getline(stream, line);) lines.push_back(line);
+  return lines;
+}
+
+// An entry as lay_out takes it.
+std::string describe(const files::directory_entry& entry, std::string name) {
+  if (entry.is_symlink()) return name.append(" > ").append(files::read_symlink(entry));
+  if (entry.is_directory()) return name.append(" /");
+  const std::string content = read(entry);
+  return name.append(content.empty() ? " =" : " = ").append(content);
+}
+
+bool reports_failed_call(const std::string& warning) {
+  const auto begins = [&](const char* text) { return warning.starts_with(text); };
+  return begins("remove: ") || begins("read_symlink: ") || begins("create_symlink: ") ||
+         begins("tz_icu::") || begins("Cannot touch ");
+}
+
+// Gives what is written on the standard error stream while `action` runs.
+std::string capture(const std::function<void()>& action) {
+  const int text = memfd_create("warnings", MFD_CLOEXEC);
+  const int stream = dup(STDERR_FILENO);
+  dup2(text, STDERR_FILENO);
+  action();
+  dup2(stream, STDERR_FILENO);
+  close(stream);
+  std::string captured = read("/proc/self/fd/" + std::to_string(text));
+  close(text);
+  return captured;
+}
+
+// Runs `action`, which gives how it ended.
+report listen(const std::function<std::string()>& action) {
+  std::string end;
+  report heard = split_lines(capture([&] { end = action(); }));
+  for (std::string& warning : heard) {
+    if (warning.starts_with(program_name)) warning.erase(0, program_name.size());
+    if (!reports_failed_call(warning)) warning = warning.substr(0, warning.rfind(": "));
+  }
+  heard.push_back(end);
+  return heard;
+}
+
+}  // namespace
+
+void lay_out(const std::string& entries) {
+  private_root::require();
+  for (const std::string& entry : split_lines(entries)) {
+    std::istringstream words(entry);
+    std::string name;
+    char kind = 0;
+    std::string content;
+    std::getline(words >> name >> kind >> std::ws, content);
+    const files::path path = files::path("/var/db/timezone") / name;
+    files::create_directories(path.parent_path());
+    files::remove_all(path);
+    if (kind == '>') files::create_symlink(content, path);
+    if (kind == '=') std::ofstream(path) << content;
+    if (kind == '/') files::create_directory(path);
+  }
+}
+
+void new_device(const std::string& entries) {
+  private_root::renew_device();
+  lay_out(entries);
+}
+
+std::set<std::string> look() {
+  std::set<std::string> found;
+  for (const files::path directory : {"/var/db/timezone", "/var/db"}) {
+    std::error_code missing;
+    for (const auto& entry : files::directory_iterator(directory, missing)) {
+      const std::string leaf = entry.path().filename();
+      if (leaf == "timezone" || leaf == "tz" || leaf == "tz_latest") continue;
+      found.insert(describe(entry, directory == "/var/db" ? entry.path().string() : leaf));
+    }
+  }
+  return found;
+}
+
+std::set<std::string> list(const std::string& entries) {
+  const auto lines = split_lines(entries);
+  return {lines.begin(), lines.end()};
+}
+
+report hear(const std::function<void()>& action) {
+  return listen([&]() -> std::string {
+    try {
+      action();
+      return "done";
+    } catch (int value) {
+      return "int " + std::to_string(value);
+    } catch (const std::invalid_argument& failure) {
+      return std::string("invalid_argument ") + failure.what();
+    } catch (const std::out_of_range&) {
+      return "out_of_range";
+    }
+  });
+}
+
+report start(const std::string& redirection) {
+  private_root::require();
+  return listen([&] {
+    // NOLINTNEXTLINE(cert-env33-c): the command is the tests' own
+    const int status = std::system(("exec env -i " PROGRAM + redirection).c_str());
+    return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
+                             : "signal " + std::to_string(WTERMSIG(status));
+  });
+}

@@ -1,0 +1,39 @@
+// The device that a private root shows: laying one out, looking at it, and starting the program.
+#pragma once
+
+#include <functional>
+#include <set>
+#include <string>
+#include <vector>
+
+// What stands on a device is written one entry a line:
+//   PATH > TARGET    a link             PATH = CONTENT   a file
+//   PATH /           a directory        PATH -           nothing
+// A path is below /var/db/timezone/ unless it begins with a slash.
+
+// Lays out entries, each in place of what was there; missing directories above an entry are made.
+// Throws std::filesystem::filesystem_error, and std::logic_error outside a private root.
+void lay_out(const std::string& entries);
+
+// The same on a new, empty device; throws what private_root::renew_device does as well.
+void new_device(const std::string& entries);
+
+// The entries directly in /var/db/timezone and /var/db, but for the updates and the link to the
+// latest: those that are the program's to change.
+std::set<std::string> look();
+
+// The lines of a text, to compare with those.
+std::set<std::string> list(const std::string& entries);
+
+// What came of an action: its warnings, without the program's name and, unless they report a failed
+// call, without the text of errno; last, how it ended.
+using report = std::vector<std::string>;
+
+// Runs `action` in this process, which must go by the program's name; ends with what it threw, such
+// as "int 17", or with "done".
+report hear(const std::function<void()>& action);
+
+// Starts the built program with nothing in its environment; ends with its status, such as "exit 0",
+// or with "signal 11". `redirection` is the shell's. Throws std::logic_error outside a private
+// root.
+report start(const std::string& redirection = "");

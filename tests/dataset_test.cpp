@@ -1,0 +1,185 @@
+// The operations on links, the components, the data sets and the marker: what they find, print,
+// throw and leave behind.
+#include <dlfcn.h>
+#include <fts.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/xattr.h>
+
+#include <cerrno>
+#include <cstring>
+#include <fstream>
+#include <type_traits>
+
+#include "dataset/olm_dataset.h"
+#include "dataset/olm_icu.h"
+#include "dataset/olm_zoneinfo.h"
+#include "driver/housekeeping.h"
+#include "fs/file_operations.h"
+#include "testbed/device.h"
+
+static_assert(!std::is_destructible_v<olm_dataset_component>);
+
+static bool no_memory_for_walks = false;
+
+// Stands before the C library's, which fails for want of memory alone.
+extern "C" FTS* fts_open(char* const* roots, int options,
+                         int (*compare)(const FTSENT**, const FTSENT**)) {
+  errno = ENOMEM;
+  if (no_memory_for_walks) return nullptr;
+  // NOLINTNEXTLINE(cppcoreguidelines-pro-type-reinterpret-cast): all that dlsym can give
+  static const auto next = reinterpret_cast<decltype(&fts_open)>(dlsym(RTLD_NEXT, "fts_open"));
+  return next(roots, options, compare);
+}
+
+namespace {
+
+using std::string;
+
+const string base = "/var/db/timezone/";
+const string update = base + "tz/2019d.1.0";
+const string version_file = "/usr/share/zoneinfo.default/+VERSION";
+
+TEST(file_operations, one_after_the_other) {
+  new_device("file =\nlink > file\ndangling > nowhere\ndirectory /\nfull > " + string(1024, 'x') +
+             "\nlonger > " + string(1025, 'y'));
+  EXPECT_TRUE(fs::exists(base + "link"));
+  EXPECT_FALSE(fs::exists(base + "dangling"));
+  EXPECT_EQ(fs::read_symlink(base + "link"), "file");
+  EXPECT_EQ(fs::read_symlink(base + "missing"), "");
+  EXPECT_EQ(fs::read_symlink(base + "full"), string(1024, 'x'));
+  EXPECT_EQ(fs::read_symlink(base + "longer"), string(1024, 'y'));
+  struct row {
+    std::function<void()> action;
+    string warning;
+    int code;
+  };
+  const row rows[] = {
+      {[] { EXPECT_EQ(fs::read_symlink(base + "file"), ""); }, "read_symlink: " + base + "file",
+       EINVAL},
+      {[] { fs::remove(base + "directory"); }, "remove: could not remove " + base + "directory",
+       EISDIR},
+      {[] { fs::remove(base + "file/x"); }, "remove: could not remove " + base + "file/x", ENOTDIR},
+      {[] { fs::create_symlink("%s", base + "dangling"); },
+       "create_symlink: from " + base + "dangling to %s", EEXIST},
+      {[] { fs::remove(base + "missing/x"); }, "", 0},
+      {[] { fs::remove(base + "dangling"); }, "", 0},
+      {[] { fs::create_symlink("%s", base + "dangling"); }, "", 0},
+  };
+  for (const auto& [action, warning, code] : rows) {
+    report heard = {warning + ": " + strerror(code), "int " + std::to_string(code)};
+    if (code == 0) heard = {"done"};
+    EXPECT_EQ(hear(action), heard);
+  }
+  EXPECT_EQ(fs::read_symlink(base + "dangling"), "%s");
+}
+
+TEST(olm_zoneinfo, reads_the_first_word) {
+  const std::pair<string, string> rows[] = {{"2019c", "2019c"},
+                                            {"\n\v\f 2019c\t2020a", "2019c"},
+                                            {"2019\xA0\x85 c", "2019\xA0\x85"},
+                                            {" \r\n", ""},
+                                            {"", ""}};
+  for (const auto& [content, word] : rows) {
+    new_device(version_file + " =");
+    std::ofstream(version_file) << content;
+    EXPECT_EQ(olm_zoneinfo().version_text, word);
+  }
+  for (const char* no_file : {" -", " /"}) {
+    lay_out(version_file + no_file);
+    EXPECT_EQ(hear([] { EXPECT_EQ(olm_zoneinfo().version_text, ""); }), report{"done"});
+  }
+}
+
+TEST(olm_icu, finds_the_schema) {
+  struct row {
+    string name;
+    char kind;
+    mode_t mode;
+    string schema;
+  };
+  const row rows[] = {
+      {"icutz44l.dat", '=', 0644, "44l"}, {"icutz64b.dat", '=', 0004, "64b"},
+      {"icutz7e.dat", '=', 0644, "7e"},   {"icutz44L.dat", '=', 0644, ""},
+      {"icutz44.dat", '=', 0644, ""},     {"icutz44l.dat.bak", '=', 0644, ""},
+      {"x-icutz44l.dat", '=', 0644, ""},  {"icutz4l4l.dat", '=', 0644, ""},
+      {"icutz44lxdat", '=', 0644, ""},    {"icutz44l.dat", '=', 0660, ""},
+      {"icutz44l.dat", '/', 0755, ""},    {"sub/icutz44l.dat", '=', 0644, ""},
+      {"icutzformat.txt", '=', 0644, ""},
+  };
+  for (const auto& [name, kind, mode, schema] : rows) {
+    const string file = update + "/icutz/" + name;
+    new_device(file + ' ' + kind + " 44l");
+    ASSERT_EQ(chmod(file.c_str(), mode), 0);
+    report heard = {"No ICU schema found for " + update, "done"};
+    if (!schema.empty()) heard = {"done"};
+    string found;
+    EXPECT_EQ(hear([&] { found = olm_icu(update).schema; }), heard) << name;
+    EXPECT_EQ(found, schema) << name;
+  }
+  // The directory may be a link, a file in it may not.
+  new_device(update + "/icutz > /var/db/timezone/elsewhere\nelsewhere/icutz44l.dat =");
+  EXPECT_EQ(olm_icu(update).schema, "44l");
+  lay_out("elsewhere/icutz44l.dat > ../file\nfile =");
+  EXPECT_EQ(hear([] { static_cast<void>(olm_icu(update)); }).size(), 2);
+  no_memory_for_walks = true;
+  const string failure = "tz_icu::initialize: fts_open of " + update +
+                         "/icutz failed, Cannot allocate memory: Cannot allocate memory";
+  EXPECT_EQ(hear([] { static_cast<void>(olm_icu(update)); }), (report{failure, "int 12"}));
+  no_memory_for_walks = false;
+}
+
+TEST(olm_icu, accepts_its_kind_alone) {
+  new_device("");
+  EXPECT_TRUE(olm_zoneinfo().compatible_schema(olm_icu()));
+  EXPECT_EQ(hear([] { EXPECT_FALSE(olm_icu().compatible_schema(olm_zoneinfo())); }),
+            (report{"olm_icu::compatible_schema: could not dynamic_cast other component", "done"}));
+}
+
+TEST(olm_dataset, path) {
+  new_device(version_file + " = 2019c");
+  EXPECT_EQ(olm_dataset("").get_name(), "2019c.1.0");
+  EXPECT_TRUE(olm_dataset("").same_path(olm_dataset()));
+  for (const string bad : {"/var/db/timezone/tz/", "/usr/share/zoneinfo.default", "2019d.1.0"}) {
+    const report heard = {"olm_dataset::create_components: bad path " + bad,
+                          "invalid_argument badpath"};
+    EXPECT_EQ(hear([&] { static_cast<void>(olm_dataset(bad)); }), heard);
+  }
+}
+
+TEST(olm_dataset, path_from_link) {
+  EXPECT_EQ(dataset_path_from_link("/usr/share/zoneinfo.default"), "");
+  EXPECT_EQ(dataset_path_from_link(update + "/zoneinfo"), update);
+  EXPECT_EQ(dataset_path_from_link(update + "/a/b"), update + "/a");
+  EXPECT_EQ(dataset_path_from_link(base + "tz/x/"), base + "tz/x");
+  for (const string& bad :
+       {string(), update, base + "tz/", base + "tz//zoneinfo", "/tmp" + update,
+        string("/usr/share/zoneinfo"), string("/usr/share/zoneinfo.default/")}) {
+    EXPECT_EQ(hear([&] { static_cast<void>(dataset_path_from_link(bad)); }),
+              (report{"Bad zoneinfo link " + bad, "int -1"}));
+  }
+}
+
+string protection_class(const string& name) {
+  string letter(1, '?');
+  const string path = base + name;
+  const auto size = getxattr(path.c_str(), "user.protection_class", letter.data(), 1);
+  return size == 1 ? letter : strerror(errno);
+}
+
+TEST(housekeeping, protects) {
+  new_device("tz /\nneeds_cleanup = kept");
+  const bool attributes = setxattr(base.c_str(), "user.probe", "", 0, 0) == 0;
+  const string recorded = attributes ? "D" : strerror(ENOTSUP);
+  protect_directories();
+  EXPECT_EQ(protection_class(""), recorded);
+  EXPECT_EQ(protection_class("tz"), recorded);
+  touch_needs_cleanup();
+  EXPECT_EQ(look(), list("needs_cleanup = kept"));
+  EXPECT_EQ(protection_class("needs_cleanup"), strerror(attributes ? ENODATA : ENOTSUP));
+  lay_out("needs_cleanup -");
+  touch_needs_cleanup();
+  EXPECT_EQ(protection_class("needs_cleanup"), recorded);
+}
+
+}  // namespace
