@@ -28,9 +28,10 @@ class olm_icu final : public olm_dataset_component {
   // it is a component of another kind.
   [[nodiscard]] bool compatible_schema(const olm_dataset_component& other) const override;
 
-  // Removes /var/db/timezone/icutz and the legacy /var/db/icutz, then, for an update, makes the
-  // first point at `directory`. Prints "unlink of ICU softlink failed" when an old link stays, and
-  // throws the errno of a link that cannot be made.
+  // Removes /var/db/timezone/icutz, then the legacy /var/db/icutz, then, for an update, makes the
+  // first point at `directory`. Prints "unlink of ICU softlink failed" when an old link stays; when
+  // that is the first, the legacy link is not tried. Throws the errno of a link that cannot be
+  // made.
   void install_link() const override;
 
   std::string schema;     // the data's format; empty when none was found

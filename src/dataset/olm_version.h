@@ -27,7 +27,7 @@ struct olm_version {
   void parse(const std::string& text);
 
   // Whether this version is strictly newer. Throws and prints nothing.
-  bool operator>(const olm_version& other) const;
+  [[nodiscard]] bool operator>(const olm_version& other) const;
 
-  bool operator==(const olm_version& other) const = default;
+  [[nodiscard]] bool operator==(const olm_version& other) const = default;
 };

@@ -13,9 +13,11 @@ void protect_directory(const std::string& directory);
 // protect_directory for /var/db/timezone/ and then for the updates below it. Prints nothing.
 void protect_directories();
 
-// Moves the ICU link of earlier systems, /var/db/icutz, to /var/db/timezone/icutz where that leads
-// nowhere, and removes the old link if it leads anywhere. Prints "Could not migrate ..." or "Could
-// not remove ...", behind the failed operation's own warning.
+// Moves the ICU link of earlier systems, /var/db/icutz, to /var/db/timezone/icutz. An old link that
+// leads nowhere stays; a new one that leads somewhere is kept and the old one goes. Prints "Could
+// not migrate ..." when the new link cannot be made, also because one that leads nowhere is in its
+// place, and "Could not remove ..." when the old one stays, behind the failed operation's own
+// warning.
 void migrate_icutz_link();
 
 // Makes sure that the marker exists; one that does is left as it is. Prints "Cannot touch file ..."

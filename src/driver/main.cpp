@@ -68,8 +68,10 @@ void settle_data_set() {
 }  // namespace
 
 int main() {
-  // Whoever collects the warnings may be gone; that must not end a start halfway.
+  // A write that fails must not end a start halfway: the warnings' reader may be gone, and files
+  // may have a limit.
   static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
+  static_cast<void>(std::signal(SIGXFSZ, SIG_IGN));
   try {
     protect_directories();
     migrate_icutz_link();
