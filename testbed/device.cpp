@@ -1,5 +1,6 @@
 #include "testbed/device.h"
 
+#include <fcntl.h>
 #include <sys/mman.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -45,25 +46,35 @@ bool reports_failed_call(const std::string& warning) {
          begins("tz_icu::") || begins("Cannot touch ");
 }
 
-// Gives what is written on the standard error stream while `action` runs.
-std::string capture(const std::function<void()>& action) {
-  const int text = memfd_create("warnings", MFD_CLOEXEC);
-  const int stream = dup(STDERR_FILENO);
-  dup2(text, STDERR_FILENO);
-  action();
-  dup2(stream, STDERR_FILENO);
-  close(stream);
-  std::string captured = read("/proc/self/fd/" + std::to_string(text));
-  close(text);
-  return captured;
-}
+// Keeps what is written on the standard error stream while it lives.
+class stream_capture {
+ public:
+  stream_capture() { dup2(text_, STDERR_FILENO); }
+  stream_capture(const stream_capture&) = delete;
+  stream_capture& operator=(const stream_capture&) = delete;
+  ~stream_capture() {
+    dup2(stream_, STDERR_FILENO);
+    close(stream_);
+    close(text_);
+  }
+
+  [[nodiscard]] std::string get_text() const {
+    return read("/proc/self/fd/" + std::to_string(text_));
+  }
+
+ private:
+  int text_ = memfd_create("warnings", MFD_CLOEXEC);
+  int stream_ = fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, 0);
+};
 
 // Runs `action`, which gives how it ended.
 report listen(const std::function<std::string()>& action) {
-  std::string end;
-  report heard = split_lines(capture([&] { end = action(); }));
+  const stream_capture capture;
+  const std::string end = action();
+  report heard = split_lines(capture.get_text());
   for (std::string& warning : heard) {
-    if (warning.starts_with(program_name)) warning.erase(0, program_name.size());
+    if (!warning.starts_with(program_name)) continue;
+    warning.erase(0, program_name.size());
     if (!reports_failed_call(warning)) warning = warning.substr(0, warning.rfind(": "));
   }
   heard.push_back(end);
@@ -107,6 +118,18 @@ std::set<std::string> look() {
   return found;
 }
 
+std::set<std::string> look_at_inputs() {
+  std::set<std::string> found;
+  for (const files::path directory : {"/var/db/timezone/tz", "/usr/share"}) {
+    std::error_code missing;
+    for (const auto& entry : files::recursive_directory_iterator(directory, missing))
+      found.insert(describe(entry, entry.path()));
+  }
+  if (const files::path latest = "/var/db/timezone/tz_latest"; files::is_symlink(latest))
+    found.insert(describe(files::directory_entry(latest), latest));
+  return found;
+}
+
 std::set<std::string> list(const std::string& entries) {
   const auto lines = split_lines(entries);
   return {lines.begin(), lines.end()};
@@ -131,7 +154,7 @@ report start(const std::string& redirection) {
   private_root::require();
   return listen([&] {
     // NOLINTNEXTLINE(cert-env33-c): the command is the tests' own
-    const int status = std::system(("exec env -i " PROGRAM + redirection).c_str());
+    const int status = std::system(("exec env -i '" PROGRAM "'" + redirection).c_str());
     return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
                              : "signal " + std::to_string(WTERMSIG(status));
   });

@@ -22,11 +22,14 @@ void new_device(const std::string& entries);
 // latest: those that are the program's to change.
 std::set<std::string> look();
 
+// The rest, with paths from the root: the updates, the link to the latest and the system partition.
+std::set<std::string> look_at_inputs();
+
 // The lines of a text, to compare with those.
 std::set<std::string> list(const std::string& entries);
 
 // What came of an action: its warnings, without the program's name and, unless they report a failed
-// call, without the text of errno; last, how it ended.
+// call, without the text of errno (a line that lacks the name stays whole); last, how it ended.
 using report = std::vector<std::string>;
 
 // Runs `action` in this process, which must go by the program's name; ends with what it threw, such

@@ -34,7 +34,10 @@ dev_t& own_device() {
 
 void check(int result, const std::string& step) {
   if (result == -1) {
-    throw std::system_error(errno, std::generic_category(), "cannot make a private root: " + step);
+    throw std::system_error(errno, std::generic_category(),
+                            "cannot make a private root (it takes root, or a kernel that "
+                            "allows user namespaces): " +
+                                step);
   }
 }
 
@@ -44,10 +47,10 @@ dev_t get_device(const char* path) {
   return status.st_dev;
 }
 
-void write_file(const char* path, const std::string& text) {
+void write_file(const files::path& path, const std::string& text) {
   std::ofstream file(path);
   file << text << std::flush;
-  check(file ? 0 : -1, std::string("write ") + path);
+  check(file ? 0 : -1, "write " + path.string());
 }
 
 void leave_namespaces() {
@@ -104,6 +107,7 @@ void enter() {
   for (const char* directory : {"/proc", "/dev"}) bind(directory, place(directory), MS_REC);
   bind_read_only(SOURCE_DIRECTORY, place(SOURCE_DIRECTORY), 0);
   bind(BUILD_DIRECTORY, place(BUILD_DIRECTORY), 0);
+  write_file(place("/.private-root"), "");
   const dev_t device = get_device(MOUNT_POINT);
   check(chroot(MOUNT_POINT), "chroot");
   check(chdir("/"), "chdir");

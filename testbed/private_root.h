@@ -1,7 +1,7 @@
 // A root directory of one process's own, in memory, in which the device's paths (/var/db and
 // /usr/share) are a made-up device's. The machine's programs and libraries and this project's
 // sources are there read-only; its /proc and /dev and the build's directory as they are. All of it
-// goes with the process.
+// goes with the process. Scripts know a private root by the file /.private-root in it.
 #pragma once
 
 namespace private_root {

@@ -8,6 +8,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 #include <fstream>
 #include <type_traits>
 
@@ -117,6 +118,10 @@ TEST(olm_icu, finds_the_schema) {
     EXPECT_EQ(hear([&] { found = olm_icu(update).schema; }), heard) << name;
     EXPECT_EQ(found, schema) << name;
   }
+  // The first in the directory's own order.
+  new_device(update + "/icutz/icutz1l.dat =\n" + update + "/icutz/icutz2l.dat =");
+  const auto first = std::filesystem::directory_iterator(update + "/icutz")->path().filename();
+  EXPECT_EQ("icutz" + olm_icu(update).schema + ".dat", first);
   // The directory may be a link, a file in it may not.
   new_device(update + "/icutz > /var/db/timezone/elsewhere\nelsewhere/icutz44l.dat =");
   EXPECT_EQ(olm_icu(update).schema, "44l");
@@ -140,6 +145,11 @@ TEST(olm_dataset, path) {
   new_device(version_file + " = 2019c");
   EXPECT_EQ(olm_dataset("").get_name(), "2019c.1.0");
   EXPECT_TRUE(olm_dataset("").same_path(olm_dataset()));
+  olm_dataset shorter;
+  EXPECT_TRUE(shorter.compatible_with(olm_dataset()));
+  shorter.components.pop_back();
+  EXPECT_FALSE(shorter.compatible_with(olm_dataset()));
+  EXPECT_FALSE(olm_dataset().compatible_with(shorter));
   for (const string bad : {"/var/db/timezone/tz/", "/usr/share/zoneinfo.default", "2019d.1.0"}) {
     const report heard = {"olm_dataset::create_components: bad path " + bad,
                           "invalid_argument badpath"};
@@ -168,18 +178,34 @@ string protection_class(const string& name) {
 }
 
 TEST(housekeeping, protects) {
-  new_device("tz /\nneeds_cleanup = kept");
+  new_device("/usr/share/icu /\ntz /\nneeds_cleanup = kept");
   const bool attributes = setxattr(base.c_str(), "user.probe", "", 0, 0) == 0;
   const string recorded = attributes ? "D" : strerror(ENOTSUP);
-  protect_directories();
-  EXPECT_EQ(protection_class(""), recorded);
-  EXPECT_EQ(protection_class("tz"), recorded);
   touch_needs_cleanup();
   EXPECT_EQ(look(), list("needs_cleanup = kept"));
   EXPECT_EQ(protection_class("needs_cleanup"), strerror(attributes ? ENODATA : ENOTSUP));
   lay_out("needs_cleanup -");
-  touch_needs_cleanup();
+  const auto count_open = [] {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+  };
+  const auto open_before = count_open();
+  EXPECT_EQ(hear([] {
+              protect_directories();
+              touch_needs_cleanup();
+            }),
+            report{"done"});
+  EXPECT_EQ(count_open(), open_before);
   EXPECT_EQ(protection_class("needs_cleanup"), recorded);
+  EXPECT_EQ(std::filesystem::status(base + "needs_cleanup").permissions(),
+            std::filesystem::perms(0644));
+  new_device("tz /");
+  EXPECT_EQ(start().back(), "exit 0");
+  EXPECT_EQ(protection_class(""), recorded);
+  EXPECT_EQ(protection_class("tz"), recorded);
+  new_device("");
+  EXPECT_EQ(
+      hear(touch_needs_cleanup),
+      (report{"Cannot touch file " + base + "needs_cleanup: No such file or directory", "done"}));
 }
 
 }  // namespace

@@ -15,8 +15,10 @@ TEST(start, each_case) {
   for (const auto& [name, device, heard, after] : table.cases) {
     SCOPED_TRACE(name);
     new_device(device);
+    const auto inputs = look_at_inputs();
     EXPECT_EQ(start(), heard);
     EXPECT_EQ(look(), list(after));
+    EXPECT_EQ(look_at_inputs(), inputs);
   }
 }
 
