@@ -32,12 +32,24 @@ std::vector<std::string> split_lines(const std::string& text) {
   return lines;
 }
 
+std::string replace(const std::string& text, const std::string& what, const std::string& by) {
+  std::string replaced = text;
+  for (std::size_t at = 0; (at = replaced.find(what, at)) != std::string::npos; at += by.size())
+    replaced.replace(at, what.size(), by);
+  return replaced;
+}
+
 // An entry as lay_out takes it.
 std::string describe(const files::directory_entry& entry, std::string name) {
-  if (entry.is_symlink()) return name.append(" > ").append(files::read_symlink(entry));
-  if (entry.is_directory()) return name.append(" /");
-  const std::string content = read(entry);
-  return name.append(content.empty() ? " =" : " = ").append(content);
+  if (entry.is_symlink()) {
+    name.append(" > ").append(files::read_symlink(entry));
+  } else if (entry.is_directory()) {
+    name.append(" /");
+  } else {
+    const std::string content = read(entry);
+    name.append(content.empty() ? " =" : " = ").append(content);
+  }
+  return replace(name, "\n", "\\n");
 }
 
 bool reports_failed_call(const std::string& warning) {
@@ -71,7 +83,14 @@ class stream_capture {
 report listen(const std::function<std::string()>& action) {
   const stream_capture capture;
   const std::string end = action();
-  report heard = split_lines(capture.get_text());
+  report heard;
+  for (const std::string& line : split_lines(capture.get_text())) {
+    if (heard.empty() || line.starts_with(program_name)) {
+      heard.push_back(line);
+    } else {
+      heard.back() += "\\n" + line;
+    }
+  }
   for (std::string& warning : heard) {
     if (!warning.starts_with(program_name)) continue;
     warning.erase(0, program_name.size());
@@ -91,7 +110,8 @@ void lay_out(const std::string& entries) {
     char kind = 0;
     std::string content;
     std::getline(words >> name >> kind >> std::ws, content);
-    const files::path path = files::path("/var/db/timezone") / name;
+    content = replace(content, "\\n", "\n");
+    const files::path path = files::path("/var/db/timezone") / replace(name, "\\n", "\n");
     files::create_directories(path.parent_path());
     files::remove_all(path);
     if (kind == '>') files::create_symlink(content, path);
@@ -120,12 +140,12 @@ std::set<std::string> look() {
 
 std::set<std::string> look_at_inputs() {
   std::set<std::string> found;
+  std::error_code missing;
   for (const files::path directory : {"/var/db/timezone/tz", "/usr/share"}) {
-    std::error_code missing;
     for (const auto& entry : files::recursive_directory_iterator(directory, missing))
       found.insert(describe(entry, entry.path()));
   }
-  if (const files::path latest = "/var/db/timezone/tz_latest"; files::is_symlink(latest))
+  if (const files::path latest = "/var/db/timezone/tz_latest"; files::is_symlink(latest, missing))
     found.insert(describe(files::directory_entry(latest), latest));
   return found;
 }
@@ -150,11 +170,11 @@ report hear(const std::function<void()>& action) {
   });
 }
 
-report start(const std::string& redirection) {
+report start(const std::string& before, const std::string& after) {
   private_root::require();
   return listen([&] {
     // NOLINTNEXTLINE(cert-env33-c): the command is the tests' own
-    const int status = std::system(("exec env -i '" PROGRAM "'" + redirection).c_str());
+    const int status = std::system((before + " '" PROGRAM "' " + after).c_str());
     return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
                              : "signal " + std::to_string(WTERMSIG(status));
   });

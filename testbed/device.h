@@ -9,7 +9,7 @@
 // What stands on a device is written one entry a line:
 //   PATH > TARGET    a link             PATH = CONTENT   a file
 //   PATH /           a directory        PATH -           nothing
-// A path is below /var/db/timezone/ unless it begins with a slash.
+// A path is below /var/db/timezone/ unless it begins with a slash. \n stands for a newline.
 
 // Lays out entries, each in place of what was there; missing directories above an entry are made.
 // Throws std::filesystem::filesystem_error, and std::logic_error outside a private root.
@@ -29,14 +29,15 @@ std::set<std::string> look_at_inputs();
 std::set<std::string> list(const std::string& entries);
 
 // What came of an action: its warnings, without the program's name and, unless they report a failed
-// call, without the text of errno (a line that lacks the name stays whole); last, how it ended.
+// call, without the text of errno; last, how it ended. A line that lacks the name belongs to the
+// warning before it, behind \n.
 using report = std::vector<std::string>;
 
 // Runs `action` in this process, which must go by the program's name; ends with what it threw, such
 // as "int 17", or with "done".
 report hear(const std::function<void()>& action);
 
-// Starts the built program with nothing in its environment; ends with its status, such as "exit 0",
-// or with "signal 11". `redirection` is the shell's. Throws std::logic_error outside a private
-// root.
-report start(const std::string& redirection = "");
+// Starts the built program; ends with its status, such as "exit 0", or with "signal 11". A shell
+// does it, to which `before` and `after` the program's path may say more: by default, that nothing
+// is in its environment. Throws std::logic_error outside a private root.
+report start(const std::string& before = "exec env -i", const std::string& after = "");

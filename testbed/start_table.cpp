@@ -4,6 +4,30 @@
 #include <sstream>
 #include <stdexcept>
 
+namespace {
+
+// The text with its \xNN and {N*TEXT} put in full.
+std::string unfold(const std::string& text) {
+  std::string unfolded;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    if (text.compare(i, 2, "\\x") == 0) {
+      unfolded += static_cast<char>(std::stoi(text.substr(i + 2, 2), nullptr, 16));
+      i += 3;
+    } else if (text[i] == '{') {
+      const std::size_t star = text.find('*', i);
+      const std::size_t end = text.find('}', star);
+      const std::string part = text.substr(star + 1, end - star - 1);
+      for (int times = std::stoi(text.substr(i + 1)); times > 0; --times) unfolded += part;
+      i = end;
+    } else {
+      unfolded += text[i];
+    }
+  }
+  return unfolded;
+}
+
+}  // namespace
+
 start_table::start_table(const std::string& file) {
   std::ifstream lines(file);
   if (!lines) throw std::runtime_error("cannot read " + file);
@@ -11,7 +35,7 @@ start_table::start_table(const std::string& file) {
   std::string state;  // the one that is being read; empty in a case
   for (std::string line; std::getline(lines, line);) {
     if (line.empty() || line.front() == '#') continue;
-    std::istringstream words(line);
+    std::istringstream words(unfold(line));
     std::string word;
     std::string rest;
     std::getline(words >> word >> std::ws, rest);
@@ -22,7 +46,7 @@ start_table::start_table(const std::string& file) {
       state.clear();
       cases.push_back({rest, "", {"exit 0"}, ""});
     } else if (indented && !state.empty()) {
-      states[state] += expand(line.substr(line.find_first_not_of(' ')));
+      states[state] += expand(rest.empty() ? word : word + ' ' + rest);
     } else if (!indented || cases.empty() || !add_to_last_case(word, rest)) {
       throw std::runtime_error(complaint + line);
     }

@@ -7,6 +7,7 @@
 //   ends END         how it ends, if not by exit 0
 //   then ENTRY       all that look() finds afterwards
 // The name of a state in place of an entry stands for its entries. A # begins a comment line.
+// Everywhere, \xNN is a byte and {N*TEXT} is TEXT N times; \n in an entry is a newline.
 #pragma once
 
 #include <map>

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <fstream>
 
 #include "testbed/device.h"
 #include "testbed/start_table.h"
@@ -22,37 +23,29 @@ TEST(start, each_case) {
   }
 }
 
-TEST(start, words_of_any_length) {
+TEST(start, crowded_update) {
+  const std::string directory = "/var/db/timezone/tz/2020a.1.0/icutz/";
   start_table table(STARTS);
-  const std::string version_file = "/usr/share/zoneinfo.default/+VERSION = ";
-  const std::string schema_file = "/usr/share/icu/icutzformat.txt = ";
-  const std::string no_record = "TZVersionDiffRecord /\n";
-  const std::size_t length = 8U << 20U;
-  const std::pair<std::string, const char*> rows[] = {
-      {version_file + std::string(length, '1'), "latest links"},
-      {version_file + std::string(length, 'a'), "latest links"},
-      {version_file + "2019" + std::string(length, 'a'), "latest links"},
-      {schema_file + std::string(length, '4'), "system links"},
-  };
-  for (const auto& [file, links] : rows) {
-    new_device(table.states["on first"] + no_record + file);
-    EXPECT_EQ(start().back(), "exit 0");
-    EXPECT_EQ(look(),
-              list(table.states[links] + table.states["zone"] + no_record + "needs_cleanup ="));
-  }
+  new_device(table.states["on system"]);
+  for (int i = 0; i < 100'000; ++i) std::ofstream(directory + std::to_string(i));
+  EXPECT_EQ(start(), report{"exit 0"});
+  EXPECT_TRUE(look().contains("TZVersionDiffRecord = 2019c.1.0_2020a.1.0"));
 }
 
-// The first warning meets a pipe that nobody reads any more.
-TEST(start, warnings_to_nobody) {
+// The first warning meets a pipe that nobody reads any more, the record a limit.
+TEST(start, writes_in_vain) {
   constexpr int write_end = 9;
   std::array<int, 2> ends{};
   ASSERT_EQ(pipe(ends.data()), 0);
   close(ends[0]);
   dup2(ends[1], write_end);
   new_device(start_table(STARTS).states["on system"] + "zoneinfo -\n");
-  EXPECT_EQ(start(" 2>&9"), report{"exit 0"});
+  EXPECT_EQ(start("exec", "2>&9"), report{"exit 0"});
   close(write_end);
   close(ends[1]);
+  new_device(start_table(STARTS).states["on system"]);
+  EXPECT_EQ(start("ulimit -f 0; exec"), report{"exit 0"});
+  EXPECT_TRUE(look().contains("TZVersionDiffRecord ="));
 }
 
 }  // namespace
