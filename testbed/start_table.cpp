@@ -46,7 +46,7 @@ start_table::start_table(const std::string& file) {
       state.clear();
       cases.push_back({rest, "", {"exit 0"}, ""});
     } else if (indented && !state.empty()) {
-      states[state] += expand(rest.empty() ? word : word + ' ' + rest);
+      states[state] += expand(rest.empty() ? word : word.append(" ").append(rest));
     } else if (!indented || cases.empty() || !add_to_last_case(word, rest)) {
       throw std::runtime_error(complaint + line);
     }

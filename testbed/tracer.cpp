@@ -8,14 +8,14 @@
 namespace {
 
 // A leak checker cannot do its work in a traced process.
-const std::string tracer = "exec env -i ASAN_OPTIONS=detect_leaks=0 strace -a0 ";
+constexpr const char* tracer = "exec env -i ASAN_OPTIONS=detect_leaks=0 strace -a0 ";
 
 }  // namespace
 
 std::vector<traced_call> trace_start(const std::string& entries) {
   const std::string log = "/tmp/calls";
   new_device(entries);
-  start(tracer + "-y -o " + log);
+  start(tracer + ("-y -o " + log));
   std::map<std::string, int> numbers;
   std::vector<traced_call> calls;
   std::ifstream lines(log);
@@ -32,7 +32,7 @@ std::string start_with(const std::string& injection, const traced_call& at,
                        const std::string& entries) {
   new_device(entries);
   const std::string inject = "-e inject=" + at.name + ":" + injection;
-  return start(tracer + "-o /dev/null -e trace=" + at.name + " " + inject +
+  return start(tracer + ("-o /dev/null -e trace=" + at.name) + " " + inject +
                ":when=" + std::to_string(at.number))
       .back();
 }

@@ -16,7 +16,9 @@
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
 #include "driver/housekeeping.h"
+#include "fs/data_protection.h"
 #include "fs/file_operations.h"
+#include "fs/olm_descriptor.h"
 #include "testbed/device.h"
 
 static_assert(!std::is_destructible_v<olm_dataset_component>);
@@ -175,6 +177,15 @@ string protection_class(const string& name) {
   const string path = base + name;
   const auto size = getxattr(path.c_str(), "user.protection_class", letter.data(), 1);
   return size == 1 ? letter : strerror(errno);
+}
+
+TEST(data_protection, keeps_errno_true) {
+  const olm_descriptor without_attributes(open("/proc", O_RDONLY));
+  errno = EXDEV;
+  EXPECT_EQ(fcntl(without_attributes.get(), F_SETPROTECTIONCLASS, PROTECTION_CLASS_D), 0);
+  EXPECT_EQ(errno, EXDEV);
+  EXPECT_EQ(fcntl(-1, F_SETPROTECTIONCLASS, PROTECTION_CLASS_D), -1);
+  EXPECT_EQ(errno, EBADF);
 }
 
 TEST(housekeeping, protects) {
