@@ -9,7 +9,6 @@
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
-#include <fstream>
 #include <type_traits>
 
 #include "dataset/olm_dataset.h"
@@ -75,23 +74,6 @@ TEST(file_operations, one_after_the_other) {
     EXPECT_EQ(hear(action), heard);
   }
   EXPECT_EQ(fs::read_symlink(base + "dangling"), "%s");
-}
-
-TEST(olm_zoneinfo, reads_the_first_word) {
-  const std::pair<string, string> rows[] = {{"2019c", "2019c"},
-                                            {"\n\v\f 2019c\t2020a", "2019c"},
-                                            {"2019\xA0\x85 c", "2019\xA0\x85"},
-                                            {" \r\n", ""},
-                                            {"", ""}};
-  for (const auto& [content, word] : rows) {
-    new_device(version_file + " =");
-    std::ofstream(version_file) << content;
-    EXPECT_EQ(olm_zoneinfo().version_text, word);
-  }
-  for (const char* no_file : {" -", " /"}) {
-    lay_out(version_file + no_file);
-    EXPECT_EQ(hear([] { EXPECT_EQ(olm_zoneinfo().version_text, ""); }), report{"done"});
-  }
 }
 
 TEST(olm_icu, finds_the_schema) {
