@@ -39,13 +39,16 @@ TEST(start, writes_in_vain) {
   ASSERT_EQ(pipe(ends.data()), 0);
   close(ends[0]);
   dup2(ends[1], write_end);
-  new_device(start_table(STARTS).states["on system"] + "zoneinfo -\n");
+  start_table table(STARTS);
+  new_device(table.states["on system"] + "zoneinfo -\n");
   EXPECT_EQ(start("exec", "2>&9"), report{"exit 0"});
   close(write_end);
   close(ends[1]);
-  new_device(start_table(STARTS).states["on system"]);
-  EXPECT_EQ(start("ulimit -f 0; exec"), report{"exit 0"});
-  EXPECT_TRUE(look().contains("TZVersionDiffRecord ="));
+  new_device(table.states["on system"]);
+  // The limit must not meet what a build that counts lines writes at its end.
+  EXPECT_EQ(start("ulimit -f 0; exec env GCOV_PREFIX=/tmp"), report{"exit 0"});
+  EXPECT_EQ(look(),
+            list(table.states["latest links"] + table.states["zone"] + "TZVersionDiffRecord ="));
 }
 
 }  // namespace
