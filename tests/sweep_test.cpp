@@ -5,6 +5,7 @@
 #include <cctype>
 #include <cstdio>
 #include <map>
+#include <ostream>
 
 #include "fs/file_operations.h"
 #include "testbed/device.h"
@@ -32,6 +33,9 @@ struct swept_start {
   int icu_link_wrong;
   int zone_lost;
 };
+
+// How CTest names it.
+std::ostream& operator<<(std::ostream& out, const swept_start& start) { return out << start.name; }
 
 // One for each start, so that they run side by side.
 class sweep : public testing::TestWithParam<swept_start> {
