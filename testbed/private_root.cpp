@@ -99,6 +99,8 @@ void bring_in(const files::path& directory) {
 }  // namespace
 
 void enter() {
+  // A device's files can be read by all, whatever the tester's own files can.
+  umask(S_IWGRP | S_IWOTH);
   leave_namespaces();
   check(mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr), "private mounts");
   mount_memory(MOUNT_POINT);

@@ -8,7 +8,8 @@ namespace private_root {
 
 // Moves this process, which must have one thread, into a private root with an empty device. Takes a
 // mount namespace, and a user namespace where that needs one, so that root and an ordinary user can
-// both do it. Throws std::system_error, whose text says in one line which step the kernel refused.
+// both do it. The umask is 022 from then on. Throws std::system_error, whose text says in one line
+// which step the kernel refused.
 void enter();
 
 // Throws std::logic_error unless this process is in a private root. For whatever writes or deletes
