@@ -8,13 +8,16 @@
 #include <sys/xattr.h>
 
 #include <cerrno>
+#include <climits>
 #include <cstring>
 #include <filesystem>
+#include <regex>
 #include <type_traits>
 
 #include "dataset/olm_dataset.h"
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
+#include "dataset/pattern.h"
 #include "driver/housekeeping.h"
 #include "fs/data_protection.h"
 #include "fs/file_operations.h"
@@ -75,6 +78,33 @@ TEST(file_operations, one_after_the_other) {
     EXPECT_EQ(hear(action), heard);
   }
   EXPECT_EQ(fs::read_symlink(base + "dangling"), "%s");
+}
+
+// The library's own way is the measure, with each byte in each place.
+TEST(pattern, matches_as_with_a_locale) {
+  const char* patterns[][2] = {
+      {R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)", "2019c.1.0"},
+      {R"(icutz([0-9]+[lbe])\.dat)", "icutz44l.dat"},
+  };
+  for (const auto& [text, example] : patterns) {
+    const olm_pattern ours = compile_pattern(text);
+    const std::regex theirs(text);
+    string name = example;
+    for (char& place : name) {
+      const char before = place;
+      for (int byte = 0; byte <= UCHAR_MAX; ++byte) {
+        place = static_cast<char>(byte);
+        std::smatch one;
+        std::smatch other;
+        std::regex_match(name, one, ours);
+        std::regex_match(name, other, theirs);
+        EXPECT_TRUE(one == other) << name;
+      }
+      place = before;
+    }
+  }
+  for (const char* refused : {"[[:digit:]]", "\\d", "[\\w]", "[[=a=]]", "[[.a.]]", "[a"})
+    EXPECT_THROW(static_cast<void>(compile_pattern(refused)), std::regex_error) << refused;
 }
 
 TEST(olm_icu, finds_the_schema) {

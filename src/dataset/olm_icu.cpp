@@ -29,7 +29,7 @@ bool may_hold_data(const FTSENT& entry) {
 // The schema in the name of the first ICU data file in `directory`, or nothing. Prints and throws
 // errno when the walk cannot be started.
 std::string find_schema(std::string directory) {
-  static const std::regex pattern = compile_pattern(R"(icutz([0-9]+[lbe])\.dat)");
+  static const olm_pattern pattern = compile_pattern(R"(icutz([0-9]+[lbe])\.dat)");
   const std::array<char*, 2> roots = {directory.data(), nullptr};
   const std::unique_ptr<FTS, walk_closer> walk(
       fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr));

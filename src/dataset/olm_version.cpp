@@ -16,7 +16,7 @@ constexpr std::size_t sub_match_count = 5;
 // The sub-matches of the version that `text` is. Prints a warning and throws std::invalid_argument
 // when it is none.
 std::smatch match_version(const std::string& text) {
-  static const std::regex pattern =
+  static const olm_pattern pattern =
       compile_pattern(R"(([0-9]+)([a-z]+)(?:\.([0-9]+))?(?:\.([0-9]+))?)");
   std::smatch results;
   const bool matched = std::regex_match(text, results, pattern);

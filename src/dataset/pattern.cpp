@@ -1,10 +1,10 @@
 #include "dataset/pattern.h"
 
-std::regex compile_pattern(const char* text) {
+olm_pattern compile_pattern(const char* text) {
 #ifdef __GLIBCXX__
   // This library's matcher recurses for each byte unless a pattern asks for its breadth-first mode.
-  return std::regex(text, std::regex::ECMAScript | std::regex_constants::__polynomial);
+  return olm_pattern(text, olm_pattern::ECMAScript | std::regex_constants::__polynomial);
 #else
-  return std::regex(text, std::regex::ECMAScript);
+  return olm_pattern(text, olm_pattern::ECMAScript);
 #endif
 }
