@@ -1,6 +1,7 @@
 // One start: decides which time-zone data set the device uses and makes the links say so.
 #include <err.h>
 
+#include <array>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -68,6 +69,9 @@ void settle_data_set() {
 }  // namespace
 
 int main() {
+  // A warning is one write, so that what others write cannot come between its parts.
+  static std::array<char, BUFSIZ> warning;
+  static_cast<void>(std::setvbuf(stderr, warning.data(), _IOLBF, warning.size()));
   // A write that fails must not end a start halfway: the warnings' reader may be gone, and files
   // may have a limit.
   static_cast<void>(std::signal(SIGPIPE, SIG_IGN));
