@@ -1,0 +1,69 @@
+#!/bin/bash
+# Tests what goes onto a system besides the program. Exits with 77 where a tool is missing.
+# usage: tests/install_test.sh BUILD_DIRECTORY trees | unit | sandbox | manual | messages
+set -euo pipefail
+build=$(realpath "$1")
+source=$(realpath "$(dirname "$0")/..")
+installed=$(mktemp -d)
+trap 'rm -r "$installed"' EXIT
+
+need() { # TOOL
+  command -v "$1" >/dev/null && return
+  echo "skipped: there is no $1 on this machine"
+  exit 77
+}
+
+install_below_prefix() { cmake --install "$build" --prefix "$installed" >/dev/null; }
+
+# Runs a command that must have nothing to say, unless about other manuals on this machine.
+stay_silent() { # COMMAND ...
+  local complaints
+  complaints=$("$@" 2>&1 | grep -vE 'referenced manual not found|outdated mandoc.db' || true)
+  echo "$complaints"
+  [ -z "$complaints" ]
+}
+
+list_tree() { # DIRECTORY
+  (cd "$1" && find . -type f | sort && grep -rh ^ExecStart= .)
+}
+
+list_expected() { # PREFIX
+  printf '%s\n' ./lib/systemd/system/tzdata-select.service ./lib/tmpfiles.d/tzdata-select.conf \
+    ./sbin/tzdata-select ./share/man/man8/tzdata-select.8 "ExecStart=$1/sbin/tzdata-select"
+}
+
+list_printed_messages() {
+  cat "$source"/src/*/*.cpp | tr '\n' ' ' | grep -oE 'warn\( *"[^"]*"' | sed 's/^[^"]*//' | sort
+}
+
+list_explained_messages() {
+  sed -n '/^\.Sh DIAGNOSTICS/,/^\.Sh SEE ALSO/s/^\.It \("[^"]*"\)$/\1/p' \
+    "$source/install/tzdata-select.8" | sort
+}
+
+case $2 in
+  trees)
+    (cd "$installed" && cmake --install "$build" --prefix prefix >/dev/null)
+    diff <(list_expected "$installed/prefix") <(list_tree "$installed/prefix")
+    DESTDIR=$installed/root cmake --install "$build" --prefix /usr >/dev/null
+    diff <(list_expected /usr) <(list_tree "$installed/root/usr")
+    ;;
+  unit)
+    need systemd-analyze
+    install_below_prefix
+    stay_silent systemd-analyze verify --man=no \
+      "$installed/lib/systemd/system/tzdata-select.service"
+    ;;
+  sandbox)
+    need systemd-analyze
+    install_below_prefix
+    # The threshold is ten times the score of 1.0.
+    systemd-analyze security --offline=true --no-pager --threshold=10 \
+      "$installed/lib/systemd/system/tzdata-select.service" | grep -v '^✓'
+    ;;
+  manual)
+    need mandoc
+    stay_silent mandoc -T lint "$source/install/tzdata-select.8"
+    ;;
+  messages) diff <(list_printed_messages) <(list_explained_messages) ;;
+esac
