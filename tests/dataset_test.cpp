@@ -193,8 +193,9 @@ string protection_class(const string& name) {
 }
 
 TEST(data_protection, keeps_errno_true) {
-  ASSERT_EQ(mount("ramfs", "/tmp", "ramfs", 0, nullptr), 0);
-  const olm_descriptor without_attributes(open("/tmp", O_RDONLY));
+  new_device("tz /");
+  ASSERT_EQ(mount("ramfs", (base + "tz").c_str(), "ramfs", 0, nullptr), 0);
+  const olm_descriptor without_attributes(open((base + "tz").c_str(), O_RDONLY));
   errno = EXDEV;
   EXPECT_EQ(fcntl(without_attributes.get(), F_SETPROTECTIONCLASS, PROTECTION_CLASS_D), 0);
   EXPECT_EQ(errno, EXDEV);
