@@ -1,6 +1,7 @@
 #!/bin/sh
-# One start as a shell script would do it, for scripts/bench to compare with: the same decision, links,
-# record and marker on a device whose names are in order and where no call fails.
+# One start as a shell script would do it, for scripts/bench to compare with. It decides the same
+# on a device whose names and local time are in order, that has no link of earlier systems, and
+# where no call fails.
 set -eu
 
 state=/var/db/timezone

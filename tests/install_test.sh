@@ -17,10 +17,11 @@ install_below_prefix() { cmake --install "$build" --prefix "$installed" >/dev/nu
 
 # Runs a command that must have nothing to say, unless about other manuals on this machine.
 stay_silent() { # COMMAND ...
-  local complaints
-  complaints=$("$@" 2>&1 | grep -vE 'referenced manual not found|outdated mandoc.db' || true)
-  echo "$complaints"
-  [ -z "$complaints" ]
+  local said status=0
+  said=$("$@" 2>&1) || status=$?
+  said=$(grep -vE 'referenced manual not found|outdated mandoc.db' <<<"$said" || true)
+  echo "$said"
+  [ -z "$said" ] && [ $status -le 1 ]
 }
 
 list_tree() { # DIRECTORY
@@ -32,8 +33,10 @@ list_expected() { # PREFIX
     ./sbin/tzdata-select ./share/man/man8/tzdata-select.8 "ExecStart=$1/sbin/tzdata-select"
 }
 
+# Whichever way something may be printed.
 list_printed_messages() {
-  cat "$source"/src/*/*.cpp | tr '\n' ' ' | grep -oE 'warn\( *"[^"]*"' | sed 's/^[^"]*//' | sort
+  cat "$source"/src/*/*.cpp | tr '\n' ' ' |
+    grep -oE '((warnx?|errx?|perror|puts|printf)\(|cerr <<)[^";]*"[^"]*"' | sed 's/^[^"]*//' | sort
 }
 
 list_explained_messages() {
@@ -43,10 +46,12 @@ list_explained_messages() {
 
 case $2 in
   trees)
-    (cd "$installed" && cmake --install "$build" --prefix prefix >/dev/null)
-    diff <(list_expected "$installed/prefix") <(list_tree "$installed/prefix")
-    DESTDIR=$installed/root cmake --install "$build" --prefix /usr >/dev/null
-    diff <(list_expected /usr) <(list_tree "$installed/root/usr")
+    (cd "$installed" && cmake --install "$build" --prefix odd%prefix >/dev/null)
+    diff <(list_expected "$installed/odd%%prefix") <(list_tree "$installed/odd%prefix")
+    DESTDIR=$installed/one cmake --install "$build" --prefix /usr >/dev/null
+    diff <(list_expected /usr) <(list_tree "$installed/one/usr")
+    DESTDIR=$installed/other cmake --install "$build" --prefix / >/dev/null
+    diff <(list_expected "") <(list_tree "$installed/other")
     ;;
   unit)
     need systemd-analyze

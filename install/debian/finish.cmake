@@ -9,3 +9,5 @@ execute_process(
   COMMAND gzip --best --no-name $ENV{DESTDIR}${documents}/changelog
     $ENV{DESTDIR}/usr/share/man/man8/tzdata-select.8
   COMMAND_ERROR_IS_FATAL ANY)
+# Whatever the umask of whoever packs.
+execute_process(COMMAND chmod -R u=rwX,go=rX $ENV{DESTDIR} COMMAND_ERROR_IS_FATAL ANY)

@@ -69,7 +69,7 @@ void settle_data_set() {
 }  // namespace
 
 int main() {
-  // A warning is one write, so that what others write cannot come between its parts.
+  // A warning that fits is one write, so that what others write cannot come between its parts.
   static std::array<char, BUFSIZ> warning;
   static_cast<void>(std::setvbuf(stderr, warning.data(), _IOLBF, warning.size()));
   // A write that fails must not end a start halfway: the warnings' reader may be gone, and files
