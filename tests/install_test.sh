@@ -31,7 +31,8 @@ list_tree() { # DIRECTORY
 list_expected() { # PREFIX
   local prefix=${1//%/%%}
   printf '%s\n' ./lib/systemd/system/tzdata-select.service ./lib/tmpfiles.d/tzdata-select.conf \
-    ./sbin/tzdata-select ./share/man/man8/tzdata-select.8 "ExecStart=${prefix// /\\x20}/sbin/tzdata-select"
+    ./sbin/tzdata-select ./share/man/man8/tzdata-select.8 \
+    "ExecStart=${prefix// /\\x20}/sbin/tzdata-select"
 }
 
 # Whichever way something may be printed.
