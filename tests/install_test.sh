@@ -15,7 +15,8 @@ need() { # TOOL
 
 install_below_prefix() { cmake --install "$build" --prefix "$installed" >/dev/null; }
 
-# Runs a command that must have nothing to say, unless about other manuals on this machine.
+# Runs a command that must have nothing to say, unless about other manuals on this machine, which
+# mandoc ends with 1.
 stay_silent() { # COMMAND ...
   local said status=0
   said=$("$@" 2>&1) || status=$?
