@@ -1,54 +1,221 @@
-// Whole starts of the built program.
+// Whole starts of the built program, a row each: a name, a device, what the program says, and what
+// it changes. device.h tells what an entry is.
 #include <gtest/gtest.h>
-#include <unistd.h>
 
-#include <array>
-#include <fstream>
-
-#include "testbed/device.h"
-#include "testbed/start_table.h"
+#include "starts.h"
 
 namespace {
 
-TEST(start, each_case) {
-  const start_table table(STARTS);
-  ASSERT_FALSE(table.cases.empty());
-  for (const auto& [name, device, heard, after] : table.cases) {
-    SCOPED_TRACE(name);
-    new_device(device);
-    const auto inputs = look_at_inputs();
-    EXPECT_EQ(start(), heard);
-    EXPECT_EQ(look(), list(after));
-    EXPECT_EQ(look_at_inputs(), inputs);
-  }
+using namespace at;
+using std::string;
+using namespace std::string_literals;
+
+// Too long for any matcher that recurses.
+constexpr std::size_t very_long = 8U << 20U;
+
+const string first = updates + "2020a.9.0";
+const string second = updates + "2020a.10.0";
+
+// An update goes by the name of its directory, whatever its files say.
+entries update(const string& path) {
+  return file(path + "/zoneinfo/+VERSION", "1999a\n") + file(path + "/icutz/icutz44l.dat", "");
 }
 
-TEST(start, crowded_update) {
-  const std::string directory = "/var/db/timezone/tz/2020a.1.0/icutz/";
-  start_table table(STARTS);
-  new_device(table.states["on system"]);
-  for (int i = 0; i < 100'000; ++i) std::ofstream(directory + std::to_string(i));
-  EXPECT_EQ(start(), report{"exit 0"});
-  EXPECT_TRUE(look().contains("TZVersionDiffRecord = 2019c.1.0_2020a.1.0"));
+entries links(const string& path) {
+  return link_to(zoneinfo, path + "/zoneinfo") + link_to(icutz, path + "/icutz");
 }
 
-// The first warning meets a pipe that nobody reads any more, the record a limit.
-TEST(start, writes_in_vain) {
-  constexpr int write_end = 9;
-  std::array<int, 2> ends{};
-  ASSERT_EQ(pipe(ends.data()), 0);
-  close(ends[0]);
-  dup2(ends[1], write_end);
-  start_table table(STARTS);
-  new_device(table.states["on system"] + "zoneinfo -\n");
-  EXPECT_EQ(start("exec", "2>&9"), report{"exit 0"});
-  close(write_end);
-  close(ends[1]);
-  new_device(table.states["on system"]);
-  // The limit must not meet what a build that counts lines writes at its end.
-  EXPECT_EQ(start("ulimit -f 0; exec env GCOV_PREFIX=/tmp"), report{"exit 0"});
-  EXPECT_EQ(look(),
-            list(table.states["latest links"] + table.states["zone"] + "TZVersionDiffRecord ="));
+const entries system_links = link_to(zoneinfo, system_zoneinfo) + gone(icutz);
+const entries default_zone = link_to(zone, zoneinfo + "/America/Los_Angeles");
+const entries no_latest = gone(latest);
+
+// A system partition of 2019c and two updates, of which the second is the latest.
+const entries on_system = file(version, "2019c") + file(schema, "44l") +
+                          file(system_zoneinfo + "/Asia/Tokyo", "") + link_to(latest, second) +
+                          link_to(zone, zoneinfo + "/Asia/Tokyo") + update(first) + update(second) +
+                          system_links;
+const entries on_first = on_system + links(first);
+const entries on_second = on_system + links(second);
+
+const string invalid = "Invalid current symlinks; resetting to system partition";
+const string given_up = "Symlink points at data incompatible with installed system";
+const string unable = "Unable to locate data; resetting to system partition";
+const string no_zone = "localtime link invalid; resetting to America/Los_Angeles";
+const string to_tokyo = "Correcting localtime link to " + zoneinfo + "/Asia/Tokyo";
+const string not_migrated = "Could not migrate /var/db/icutz to /var/db/timezone/icutz";
+const string no_icutz_unlink = "unlink of ICU softlink failed";
+
+const string unparsed = "Cannot parse version string ";
+const string no_results = ", results.size() = 0";
+
+string refuse(const string& one, const string& other) {
+  return "New update not compatible or older version: " + one + " vs. " + other;
+}
+
+string fail_to_link(const string& path, const string& target) {
+  return "create_symlink: from " + path + " to " + target;
 }
 
 }  // namespace
+
+const std::vector<whole_start> starts = {
+    // Which data set
+    {.name = "a first update",
+     .before = on_system,
+     .changes = links(second) + file(record, "2019c.1.0_2020a.10.0")},
+    {.name = "the next update",
+     .before = on_first + file(record, "longer than what replaces it"),
+     .changes = links(second) + file(marker, "") + file(record, "2020a.9.0_2020a.10.0")},
+    {.name = "nothing new, and the marker of the last start",
+     .before = on_second + file(marker, "") + file(record, "a_b"),
+     .says = {refuse("2020a.10.0", "2020a.10.0")},
+     .changes = gone(marker)},
+    {.name = "a system upgraded past the update",
+     .before = on_second + file(version, "2020b"),
+     .says = {given_up, refuse("2020a.10.0", "2020a.10.0")},
+     .changes = system_links + file(marker, "")},
+    {.name = "a system upgraded past both updates; a marker that cannot be looked at",
+     .before = on_first + file(version, "2020b"),
+     .says = {given_up, "Cannot touch file " + marker},
+     .changes = links(second) + file(marker, "") + file(record, "2020b.1.0_2020a.10.0"),
+     .tracing = {"-P", marker, "-e", "inject=/fstat:error=EIO"}},
+    {.name = "a system upgraded to another ICU format",
+     .before = on_second + file(version, "2019e") + file(schema, "45l"),
+     .says = {given_up, refuse("2020a.10.0", "2020a.10.0")},
+     .changes = system_links + file(marker, "")},
+    {.name = "an incompatible update",
+     .before = on_first + gone(second + "/icutz") + file(second + "/icutz/icutz44b.dat", ""),
+     .says = {refuse("2020a.10.0", "2020a.9.0")}},
+    {.name = "an update of the system's version, then a newer one; a marker that cannot be closed",
+     .before = on_system + update(updates + "2019c.1.0") + links(updates + "2019c.1.0") +
+               file(version, "\n \v\f2019c\t2020b") + file(schema, "\n44l\r\n44b"),
+     .says = {"Cannot touch file " + marker},
+     .changes = links(second) + file(marker, "") + file(record, "2019c.1.0_2020a.10.0"),
+     .tracing = {"-P", marker, "-e", "inject=close:error=EIO"}},
+    {.name = "an older update; a legacy link to nowhere; a zone beside the link",
+     .before = on_second + link_to(latest, first) + link_to(legacy_icutz, "nowhere") +
+               link_to(zone, zoneinfo + ".old"),
+     .says = {refuse("2020a.9.0", "2020a.10.0")}},
+    {.name = "updates that are gone; a legacy link to nowhere; a relative zone",
+     .before = on_first + gone(first) + gone(second) + link_to(legacy_icutz, "nowhere") +
+               link_to(zone, "zoneinfo/UTC"),
+     .says = {"No ICU schema found for " + first, given_up, "No ICU schema found for " + second,
+              refuse("2020a.10.0", "2020a.9.0"), no_zone},
+     .changes = system_links + default_zone + file(marker, "") + gone(legacy_icutz)},
+    {.name = "no links",
+     .before = on_system + gone(zoneinfo) + gone(zone),
+     .says = {"Bad zoneinfo link ", invalid, no_zone},
+     .changes = links(second) + default_zone + file(record, "2019c.1.0_2020a.10.0")},
+    {.name = "a zoneinfo link to neither kind of data set; no update; a zone cut short",
+     .before = on_first + no_latest + link_to(zoneinfo, "/usr/share/%s%n") +
+               link_to(zone, "/var/db/timezone/zoneinf"),
+     .says = {"Bad zoneinfo link /usr/share/%s%n", invalid, no_zone},
+     .changes = system_links + default_zone},
+    {.name = "a latest update elsewhere; a zone by the name of the system's own directory",
+     .before = on_first + link_to(latest, "%s%n") + link_to(zone, system_zoneinfo + "/Asia/Tokyo"),
+     .says = {"olm_dataset::create_components: bad path %s%n", unable,
+              "Correcting localtime link to " + zoneinfo + ".default/Asia/Tokyo", no_zone},
+     .changes = system_links + default_zone},
+    {.name = "a latest update that is no link, found before the missing zoneinfo link",
+     .before = on_first + gone(zoneinfo) + file(latest, "") + file(zone, ""),
+     .says = {"read_symlink: " + latest, unable, "read_symlink: " + zone, no_zone},
+     .changes = system_links + default_zone},
+    {.name = "a system partition without data",
+     .before = on_first + gone(system_zoneinfo) + gone("/usr/share/icu"),
+     .says = {unparsed + ".1.0" + no_results, unparsed + ".1.0", given_up,
+              unparsed + ".1.0" + no_results, unparsed + ".1.0", refuse("2020a.10.0", "2020a.9.0")},
+     .changes = system_links + file(marker, "")},
+
+    // What earlier systems left behind, and the zone
+    {.name = "an ICU link of earlier systems",
+     .before = on_system + no_latest + link_to(legacy_icutz, "../../usr/share/icu") +
+               folder("/var/db/icu"),
+     .changes = gone(legacy_icutz) + gone("/var/db/icu") + link_to(icutz, "../../usr/share/icu")},
+    {.name = "both ICU links",
+     .before = on_first + no_latest + link_to(legacy_icutz, "/usr/share/icu"),
+     .changes = gone(legacy_icutz)},
+    {.name = "a zone among the system's own",
+     .before = on_system + no_latest + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = {to_tokyo},
+     .changes = link_to(zone, zoneinfo + "/Asia/Tokyo")},
+
+    // What fails
+    {.name = "a directory in the ICU link's place, which keeps the legacy link as it is",
+     .before =
+         on_first + gone(icutz) + file(icutz + "/kept", "") + link_to(legacy_icutz, "nowhere"),
+     .says = {"remove: could not remove " + icutz, no_icutz_unlink,
+              fail_to_link(icutz, second + "/icutz"), unable, "remove: could not remove " + icutz,
+              no_icutz_unlink},
+     .changes = link_to(zoneinfo, system_zoneinfo)},
+    {.name = "a directory in the zoneinfo link's place, which keeps the ICU link as it is",
+     .before = on_first + gone(zoneinfo) + file(zoneinfo + "/kept", ""),
+     .says = {"read_symlink: " + zoneinfo, invalid, "remove: could not remove " + zoneinfo,
+              "Unlink of zoneinfo softlink failed", fail_to_link(zoneinfo, system_zoneinfo), unable,
+              "remove: could not remove " + zoneinfo, "Unlink of zoneinfo softlink failed",
+              fail_to_link(zoneinfo, system_zoneinfo)},
+     .ends = "exit 1"},
+    {.name = "directories in the places of the old links, the marker and the record",
+     .before = on_first + gone(icutz) + folder(legacy_icutz) + file("/var/db/icu/kept", "") +
+               file(marker + "/kept", "") + folder(record),
+     .says = {"read_symlink: /var/db/icutz", not_migrated, "remove: could not remove /var/db/icutz",
+              "Could not remove /var/db/icutz", "remove: could not remove /var/db/icutz",
+              no_icutz_unlink, "Cannot touch file " + marker},
+     .changes = links(second)},
+    {.name = "links that can be removed but not made",
+     .before = on_system + no_latest + link_to(legacy_icutz, "/usr/share/icu") +
+               link_to(icutz, "nowhere") + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = {fail_to_link(icutz, "/usr/share/icu"), not_migrated, to_tokyo,
+              fail_to_link(zone, zoneinfo + "/Asia/Tokyo"), no_zone,
+              fail_to_link(zone, zoneinfo + "/America/Los_Angeles")},
+     .changes = gone(legacy_icutz) + gone(zone),
+     .ends = "exit 1",
+     .tracing = {"-e", "inject=/^symlink:error=EROFS"}},
+    {.name = "warnings that nobody reads any more",
+     .before = on_system + gone(zoneinfo),
+     .changes = links(second) + file(record, ""),
+     .tracing = {"-e", "inject=write:error=EPIPE:signal=PIPE"}},
+
+    // Nonsense
+    {.name = "a version of 8 MB, and a limit to the size of files",
+     .before = on_system + file(version, "2019" + string(very_long, 'z')),
+     .changes = links(second) + file(record, ""),
+     .tracing = {"-e", "inject=/^write:error=EFBIG:signal=XFSZ"}},
+    {.name = "a number of 8 MB",
+     .before = on_first + file(version, string(very_long, '1') + "c"),
+     .says = {unable},
+     .ends = "exit 1"},
+    {.name = "bytes that are no letters, or white space elsewhere",
+     .before = on_system + file(version, "%s\xA0\x85\0%n"s),
+     .says = {unparsed + "%s\xA0\x85" + no_results, unparsed + "%s\xA0\x85",
+              unparsed + "%s\xA0\x85" + no_results, unparsed + "%s\xA0\x85"},
+     .changes = links(second) + file(record, "%s\xA0\x85\0%n.1.0_2020a.10.0"s)},
+    {.name = "names that are formats of two lines",
+     .before = on_system + update(updates + "%s%n\n%d") + links(updates + "%s%n\n%d") +
+               link_to(latest, updates + "%n\n") + link_to(zone, "/usr/share/zoneinfo/%s%n"),
+     .says = {unparsed + "%s%n\n%d" + no_results, unparsed + "%s%n\n%d", given_up,
+              unparsed + "%n\n" + no_results, unparsed + "%n\n",
+              "No ICU schema found for " + updates + "%n\n", refuse("%n\n", "%s%n\n%d"),
+              "Correcting localtime link to " + zoneinfo + "/%s%n", no_zone},
+     .changes = system_links + default_zone + file(marker, "")},
+    {.name = "links of 4095 bytes, of which 1024 count",
+     .before = on_system + link_to(zoneinfo, updates + string(4066, 'x') + "/zoneinfo") +
+               link_to(latest, updates + string(4075, 'y')) +
+               link_to(zone, "/usr/share/zoneinfo" + string(4076, 'z')),
+     .says = {"Bad zoneinfo link " + updates + string(1004, 'x'), invalid,
+              unparsed + string(1004, 'y') + no_results, unparsed + string(1004, 'y'),
+              "No ICU schema found for " + updates + string(1004, 'y'),
+              refuse(string(1004, 'y'), "2019c.1.0"),
+              "Correcting localtime link to " + zoneinfo + string(1005, 'z'), no_zone},
+     .changes = system_links + default_zone},
+};
+
+TEST(start, each_case) {
+  for (const auto& row : starts) {
+    SCOPED_TRACE(row.name);
+    lay_out(row.before);
+    report heard = row.says;
+    heard.push_back(row.ends);
+    EXPECT_EQ(start(row.tracing), heard);
+    EXPECT_EQ(look(), change(change({}, row.before), row.changes));
+  }
+}

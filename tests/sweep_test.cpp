@@ -1,123 +1,131 @@
-// Kills a start before each of its system calls on the device's files, and fails each such call.
+// Kills starts before each of their system calls on the device's files, and fails each such call.
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <cctype>
 #include <cstdio>
-#include <map>
+#include <fstream>
 #include <ostream>
 
 #include "fs/file_operations.h"
-#include "testbed/device.h"
-#include "testbed/start_table.h"
-#include "testbed/tracer.h"
+#include "starts.h"
 
 namespace {
 
-std::map<std::string, std::string> read_links() {
-  std::map<std::string, std::string> links;
-  for (const std::string name : {"zoneinfo", "icutz", "localtime"})
-    links[name] = fs::read_symlink("/var/db/timezone/" + name);
-  return links;
-}
-
-bool leads_to_whole_data_set(const std::string& target) {
-  const std::string update = target.substr(0, target.rfind('/'));
-  return fs::exists(target + "/+VERSION") &&
-         (target == "/usr/share/zoneinfo.default" || fs::exists(update + "/icutz/icutz44l.dat"));
-}
-
-// A start, and how many of its kill points leave a link wrong that the next start doesn't heal.
+// A start, and how often its kills and faults leave a link wrong that no later start heals.
 struct swept_start {
   std::string name;
-  int icu_link_wrong;
-  int zone_lost;
+  int icu_wrong_by_kill = 0;
+  int zone_lost_by_kill = 0;
+  int icu_wrong_by_fault = 0;
 };
 
 // How CTest names it.
 std::ostream& operator<<(std::ostream& out, const swept_start& start) { return out << start.name; }
 
 // One for each start, so that they run side by side.
-class sweep : public testing::TestWithParam<swept_start> {
- public:
-  void SetUp() override {
-    const start_table table(STARTS);
-    for (const auto& row : table.cases)
-      if (row.name == GetParam().name) device = row.device;
-    calls = trace_start(device);
-    ASSERT_FALSE(calls.empty()) << "is strace there?";
-    undisturbed = read_links();
-  }
+class sweep : public testing::TestWithParam<swept_start> {};
 
-  // Starts undisturbed on what another start left. Gives the links that are not as they would be
-  // without that other start.
-  std::string heal() {
-    EXPECT_EQ(start().back(), "exit 0");
-    std::string wrong;
-    const auto links = read_links();
-    EXPECT_TRUE(leads_to_whole_data_set(links.at("zoneinfo")));
-    for (const auto& [name, target] : undisturbed) wrong += links.at(name) == target ? "" : name;
-    return wrong;
-  }
+// The links as they are.
+struct link_targets {
+  std::string zoneinfo = fs::read_symlink(at::zoneinfo);
+  std::string icutz = fs::read_symlink(at::icutz);
+  std::string zone = fs::read_symlink(at::zone);
 
-  std::string device;
-  std::vector<traced_call> calls;
-  std::map<std::string, std::string> undisturbed;
+  bool operator==(const link_targets&) const = default;
+
+  // Where the ICU link belongs, with these zone files: nowhere with the system partition's.
+  [[nodiscard]] std::string own_icutz() const {
+    const bool on_system = zoneinfo == at::system_zoneinfo;
+    return on_system ? "" : zoneinfo.substr(0, zoneinfo.rfind('/')) + "/icutz";
+  }
+  [[nodiscard]] bool lead_to_whole_data_set() const {
+    return fs::exists(zoneinfo + "/+VERSION") &&
+           (own_icutz().empty() || fs::exists(own_icutz() + "/icutz44l.dat"));
+  }
 };
 
-TEST_P(sweep, kills) {
-  std::map<std::string, int> points;  // by what stays wrong
-  for (const auto& call : calls) {
-    SCOPED_TRACE(call.text);
-    EXPECT_EQ(start_with("signal=KILL", call, device), "signal 9");
-    const auto torn = read_links();
-    const std::string wrong = heal();
-    ++points[wrong];
-    const bool between_links = torn.at("zoneinfo") == undisturbed.at("zoneinfo") &&
-                               torn.at("icutz") != undisturbed.at("icutz");
-    EXPECT_TRUE(wrong.empty() || (wrong == "icutz" && between_links) ||
-                (wrong == "localtime" && torn.at("localtime").empty()))
-        << wrong;
-    const auto healed = read_links();
-    EXPECT_EQ(start().back(), "exit 0");
-    EXPECT_EQ(read_links(), healed);
-  }
-  EXPECT_EQ(points["icutz"], GetParam().icu_link_wrong);
-  EXPECT_EQ(points["localtime"], GetParam().zone_lost);
-  std::printf("sweep: %zu kill points, %d healed, %d ICU link wrong, %d zone lost\n", calls.size(),
-              points[""], points["icutz"], points["localtime"]);
+// The links after an undisturbed start on what another one left.
+link_targets heal() {
+  EXPECT_EQ(start().back(), "exit 0");
+  return {};
 }
 
-TEST_P(sweep, faults) {
-  int faults = 0;
-  int lasting = 0;
-  for (const auto& call : calls) {
-    for (const char* error : {"EIO", "EACCES", "ENOSPC", "EROFS"}) {
-      SCOPED_TRACE(call.text + " fails with " + error);
-      const std::string end = start_with(std::string("error=") + error, call, device);
-      const auto links = read_links();
-      EXPECT_TRUE(end == "exit 1" || (end == "exit 0" && !links.at("localtime").empty())) << end;
-      EXPECT_TRUE(leads_to_whole_data_set(links.at("zoneinfo")));
-      ++faults;
-      lasting += heal().empty() ? 0 : 1;
+bool has(const std::string& line, const char* text) { return line.find(text) != std::string::npos; }
+
+// The calls on the device's files that a start makes, as strace prints them, each with what
+// strace needs to find it again. No call of a start closes what is not open.
+std::vector<std::pair<std::string, std::string>> trace_start() {
+  start({"-y", "-o", "/var/calls"});
+  std::vector<std::pair<std::string, std::string>> calls;
+  std::map<std::string, int> numbers;
+  std::ifstream lines("/var/calls");
+  for (std::string line; std::getline(lines, line);) {
+    const std::string name = line.substr(0, line.find('('));
+    const std::string number = std::to_string(++numbers[name]);
+    EXPECT_FALSE(has(line, "EBADF")) << line;
+    const bool is_warning = line.starts_with("write(2");
+    if (!is_warning && (has(line, "/var/db") || has(line, "/usr/share")))
+      calls.emplace_back(line, "inject=" + name + ":when=" + number + ":");
+  }
+  EXPECT_FALSE(calls.empty()) << "is strace there?";
+  return calls;
+}
+
+TEST_P(sweep, leaves_a_whole_data_set) {
+  const auto row = std::find_if(starts.begin(), starts.end(),
+                                [](const auto& one) { return one.name == GetParam().name; });
+  ASSERT_NE(row, starts.end());
+  lay_out(row->before);
+  const auto calls = trace_start();
+  const link_targets undisturbed;
+  std::map<std::string, int> found;
+  for (const auto& [call, injection] : calls) {
+    for (const std::string what :
+         {"signal=KILL", "error=EIO", "error=EACCES", "error=ENOSPC", "error=EROFS"}) {
+      SCOPED_TRACE(what + " at " + call);
+      lay_out(row->before);
+      const report heard = start({"-e", injection + what});
+      const link_targets left;
+      const link_targets healed = heal();
+      EXPECT_TRUE(healed.lead_to_whole_data_set());
+      if (what == "signal=KILL") {
+        ++found["kills"];
+        EXPECT_EQ(heard.back(), "signal 9");
+        EXPECT_EQ(healed.zoneinfo, undisturbed.zoneinfo);
+        EXPECT_EQ(heal(), healed);
+        if (healed.icutz != undisturbed.icutz) {
+          ++found["kills leave the ICU link wrong"];
+          EXPECT_EQ(left.zoneinfo, undisturbed.zoneinfo);
+        }
+        if (healed.zone != undisturbed.zone) {
+          ++found["kills lose the zone"];
+          EXPECT_EQ(left.zone, "");
+        }
+        continue;
+      }
+      ++found["faults"];
+      EXPECT_TRUE(left.lead_to_whole_data_set());
+      EXPECT_EQ(heard.back(), left.zone.empty() ? "exit 1" : "exit 0");
+      if (healed != undisturbed) ++found["faults have a lasting effect"];
+      if (healed.icutz != healed.own_icutz() && healed.icutz != undisturbed.icutz) {
+        ++found["faults leave the ICU link wrong"];
+        EXPECT_TRUE(has(call, "unlink(\"/var/db/timezone/icutz\""));
+      }
     }
   }
-  std::printf("sweep: %d faults, %d lasting\n", faults, lasting);
+  for (const auto& [what, times] : found) std::printf("sweep: %d %s\n", times, what.c_str());
+  EXPECT_EQ(found["kills leave the ICU link wrong"], GetParam().icu_wrong_by_kill);
+  EXPECT_EQ(found["kills lose the zone"], GetParam().zone_lost_by_kill);
+  EXPECT_EQ(found["faults leave the ICU link wrong"], GetParam().icu_wrong_by_fault);
 }
 
 INSTANTIATE_TEST_SUITE_P(
     starts, sweep,
-    testing::Values(swept_start{"a first update", 3, 0}, swept_start{"the next update", 3, 0},
-                    swept_start{"nothing new, and the marker of the last start", 0, 0},
-                    swept_start{"a system upgraded past the update", 1, 0},
-                    swept_start{"an incompatible update", 0, 0}, swept_start{"no links", 3, 0},
-                    swept_start{"an ICU link of earlier systems", 0, 0},
-                    swept_start{"a zone among the system's own", 0, 1}),
-    [](const auto& start) {
-      std::string name = start.param.name;
-      std::replace_if(
-          name.begin(), name.end(), [](char c) { return std::isalnum(c) == 0; }, '_');
-      return name;
-    });
+    testing::Values(swept_start{"a first update", 3}, swept_start{"the next update", 3},
+                    swept_start{"nothing new, and the marker of the last start"},
+                    swept_start{"a system upgraded past the update", 1, 0, 4},
+                    swept_start{"an incompatible update"}, swept_start{"no links", 3},
+                    swept_start{"an ICU link of earlier systems"},
+                    swept_start{"a zone among the system's own", 0, 1}));
 
 }  // namespace

@@ -1,0 +1,133 @@
+#include "device.h"
+
+#include <gtest/gtest.h>
+#include <spawn.h>
+#include <sys/mount.h>
+#include <sys/wait.h>
+
+#include <array>
+#include <cerrno>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <stdexcept>
+#include <string_view>
+#include <system_error>
+
+namespace {
+
+namespace files = std::filesystem;
+
+constexpr std::array roots = {"/var/db", "/usr/share"};
+
+// What stands at a path, if no file.
+constexpr std::string_view arrow = "-> ";
+constexpr const char* directory = "(directory)";
+constexpr const char* nothing = "(nothing)";
+
+// Takes down what `action`, which gives how it ended, writes on the standard error stream.
+report listen(const std::function<std::string()>& action) {
+  const std::string name = "\ntzdata-select: ";
+  testing::internal::CaptureStderr();
+  report heard = {action()};
+  std::string text = "\n";
+  text += testing::internal::GetCapturedStderr();
+  for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
+    const std::string warning = text.substr(at + name.size());
+    heard.insert(heard.begin(), warning.substr(0, warning.rfind(": ")));
+  }
+  if (text.size() > 1) heard.insert(heard.begin(), text);
+  return heard;
+}
+
+}  // namespace
+
+entries file(const std::string& path, const std::string& words) { return {{path, words}}; }
+entries link_to(const std::string& path, const std::string& target) {
+  return {{path, std::string(arrow) + target}};
+}
+entries folder(const std::string& path) { return {{path, directory}}; }
+entries gone(const std::string& path) { return {{path, nothing}}; }
+
+entries operator+(entries first, const entries& then) {
+  first.insert(first.end(), then.begin(), then.end());
+  return first;
+}
+
+device change(device before, const entries& changes) {
+  for (const auto& [path, what] : changes) {
+    std::erase_if(before, [&, name = path](const auto& there) {
+      return there.first == name || there.first.starts_with(name + "/");
+    });
+    if (what != nothing) before[path] = what;
+  }
+  return before;
+}
+
+void lay_out(const entries& contents) {
+  static bool is_laid_out = false;
+  if (!files::exists("/var/private-root")) throw std::logic_error("not inside a private root");
+  for (const char* root : roots) {
+    if (is_laid_out) umount2(root, MNT_DETACH);
+    if (mount("tmpfs", root, "tmpfs", 0, "mode=755") != 0)
+      throw std::system_error(errno, std::generic_category(), root);
+  }
+  is_laid_out = true;
+  for (const auto& [name, what] : change({}, contents)) {
+    const files::path path = name;
+    files::create_directories(what == directory ? path : path.parent_path());
+    if (what.starts_with(arrow)) {
+      files::create_symlink(what.substr(arrow.size()), path);
+    } else if (what != directory) {
+      std::ofstream(path) << what;
+    }
+  }
+}
+
+device look() {
+  device found;
+  for (const char* root : roots) {
+    for (const auto& there : files::recursive_directory_iterator(root)) {
+      if (there.is_symlink()) {
+        found[there.path()] = std::string(arrow) + files::read_symlink(there).string();
+      } else if (!there.is_directory()) {
+        found[there.path()] = (std::ostringstream() << std::ifstream(there.path()).rdbuf()).str();
+      } else if (files::is_empty(there)) {
+        found[there.path()] = directory;
+      }
+    }
+  }
+  return found;
+}
+
+report start(std::vector<std::string> tracing) {
+  if (!tracing.empty()) tracing.insert(tracing.begin(), {"strace", "-o", "/dev/null"});
+  // A leak checker cannot do its work in a traced process.
+  std::string variable = tracing.empty() ? "ASAN_OPTIONS=" : "ASAN_OPTIONS=detect_leaks=0";
+  const std::array<char*, 2> environment = {variable.data(), nullptr};
+  tracing.emplace_back(PROGRAM);
+  std::vector<char*> command;
+  for (std::string& word : tracing) command.push_back(word.data());
+  command.push_back(nullptr);
+  return listen([&] {
+    pid_t process = 0;
+    int status = 0;
+    posix_spawnp(&process, command[0], nullptr, nullptr, command.data(), environment.data());
+    waitpid(process, &status, 0);
+    return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
+                             : "signal " + std::to_string(WTERMSIG(status));
+  });
+}
+
+report hear(const std::function<void()>& action) {
+  return listen([&]() -> std::string {
+    try {
+      action();
+    } catch (int value) {
+      return "int " + std::to_string(value);
+    } catch (const std::exception& failure) {
+      return failure.what();
+    }
+    return "done";
+  });
+}

@@ -1,0 +1,58 @@
+// The device that a private root shows: laying one out, looking at it, starting the program on it.
+#pragma once
+
+#include <functional>
+#include <map>
+#include <string>
+#include <utility>
+#include <vector>
+
+// The device's paths.
+namespace at {
+inline const std::string system_zoneinfo = "/usr/share/zoneinfo.default";
+inline const std::string version = system_zoneinfo + "/+VERSION";
+inline const std::string schema = "/usr/share/icu/icutzformat.txt";
+inline const std::string base = "/var/db/timezone/";
+inline const std::string updates = base + "tz/";
+inline const std::string latest = base + "tz_latest";
+inline const std::string zoneinfo = base + "zoneinfo";
+inline const std::string icutz = base + "icutz";
+inline const std::string zone = base + "localtime";
+inline const std::string marker = base + "needs_cleanup";
+inline const std::string record = base + "TZVersionDiffRecord";
+inline const std::string legacy_icutz = "/var/db/icutz";
+}  // namespace at
+
+// What stands at which paths: entries, each in place of what an earlier one put there.
+using entries = std::vector<std::pair<std::string, std::string>>;
+
+entries file(const std::string& path, const std::string& words);
+entries link_to(const std::string& path, const std::string& target);
+entries folder(const std::string& path);
+entries gone(const std::string& path);  // nothing
+
+entries operator+(entries first, const entries& then);
+
+// What stands at each path below /var/db and /usr/share that is no directory with something in it.
+using device = std::map<std::string, std::string>;
+
+// `before` with each of `changes`, in order, in place of what stood at its path and below.
+device change(device before, const entries& changes);
+
+// Puts a new device with `contents` in place of the one that was there; nothing is deleted for it.
+// Throws std::logic_error outside a private root, std::system_error when the kernel refuses.
+void lay_out(const entries& contents);
+
+// The device as it is.
+device look();
+
+// What came of an action: its warnings, without the program's name and the text of errno, then how
+// it ended. A line that lacks the name belongs to the warning before it.
+using report = std::vector<std::string>;
+
+// Starts the built program, under strace if there are `tracing` options for it; ends with its
+// status, such as "exit 0", or with "signal 11".
+report start(std::vector<std::string> tracing = {});
+
+// Runs `action` in this process; ends with what it threw, such as "int 17", or with "done".
+report hear(const std::function<void()>& action);
