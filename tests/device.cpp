@@ -34,7 +34,8 @@ report listen(const std::function<std::string()>& action) {
   text += testing::internal::GetCapturedStderr();
   for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
     const std::string warning = text.substr(at + name.size());
-    heard.insert(heard.begin(), warning.substr(0, warning.rfind(": ")));
+    const std::size_t end = warning.rfind(": ");
+    heard.insert(heard.begin(), end == std::string::npos ? text : warning.substr(0, end));
   }
   if (text.size() > 1) heard.insert(heard.begin(), text);
   return heard;
@@ -48,11 +49,6 @@ entries link_to(const std::string& path, const std::string& target) {
 }
 entries folder(const std::string& path) { return {{path, directory}}; }
 entries gone(const std::string& path) { return {{path, nothing}}; }
-
-entries operator+(entries first, const entries& then) {
-  first.insert(first.end(), then.begin(), then.end());
-  return first;
-}
 
 device change(device before, const entries& changes) {
   for (const auto& [path, what] : changes) {
@@ -101,10 +97,9 @@ device look() {
 }
 
 report start(std::vector<std::string> tracing) {
-  if (!tracing.empty()) tracing.insert(tracing.begin(), {"strace", "-o", "/dev/null"});
   // A leak checker cannot do its work in a traced process.
-  std::string variable = tracing.empty() ? "ASAN_OPTIONS=" : "ASAN_OPTIONS=detect_leaks=0";
-  const std::array<char*, 2> environment = {variable.data(), nullptr};
+  const auto tracer = {"strace", "-E", "ASAN_OPTIONS=detect_leaks=0", "-o", "/dev/null"};
+  if (!tracing.empty()) tracing.insert(tracing.begin(), tracer.begin(), tracer.end());
   tracing.emplace_back(PROGRAM);
   std::vector<char*> command;
   for (std::string& word : tracing) command.push_back(word.data());
@@ -112,7 +107,8 @@ report start(std::vector<std::string> tracing) {
   return listen([&] {
     pid_t process = 0;
     int status = 0;
-    posix_spawnp(&process, command[0], nullptr, nullptr, command.data(), environment.data());
+    char** const no_environment = &command.back();
+    posix_spawnp(&process, command[0], nullptr, nullptr, command.data(), no_environment);
     waitpid(process, &status, 0);
     return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
                              : "signal " + std::to_string(WTERMSIG(status));

@@ -31,7 +31,12 @@ entries link_to(const std::string& path, const std::string& target);
 entries folder(const std::string& path);
 entries gone(const std::string& path);  // nothing
 
-entries operator+(entries first, const entries& then);
+// One list after the other.
+template <typename element>
+std::vector<element> operator+(std::vector<element> first, const std::vector<element>& then) {
+  first.insert(first.end(), then.begin(), then.end());
+  return first;
+}
 
 // What stands at each path below /var/db and /usr/share that is no directory with something in it.
 using device = std::map<std::string, std::string>;

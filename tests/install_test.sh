@@ -4,13 +4,6 @@
 set -euo pipefail
 build=$(realpath "$1")
 source=$(realpath "$(dirname "$0")/..")
-manual=$source/install/tzdata-select.8
-
-need() { # TOOL
-  command -v "$1" >/dev/null && return
-  echo "skipped: there is no $1 on this machine"
-  exit 77
-}
 
 # Whichever way something may be printed.
 list_printed_messages() {
@@ -19,12 +12,16 @@ list_printed_messages() {
 }
 
 list_explained_messages() {
-  sed -n '/^\.Sh DIAGNOSTICS/,/^\.Sh SEE ALSO/s/^\.It \("[^"]*"\)$/\1/p' "$manual" | sort
+  sed -n '/^\.Sh DIAGNOSTICS/,/^\.Sh SEE ALSO/s/^\.It \("[^"]*"\)$/\1/p' \
+    "$source/install/tzdata-select.8" | sort
 }
 
 # In a directory whose name systemd reads as something else, unless the unit takes care.
 test_unit() {
-  need systemd-analyze
+  if ! command -v systemd-analyze >/dev/null; then
+    echo "skipped: there is no systemd-analyze on this machine"
+    exit 77
+  fi
   installed=$(mktemp -d)
   trap 'rm -r "$installed"' EXIT
   cmake --install "$build" --prefix "$installed/odd %prefix" >/dev/null
@@ -36,10 +33,6 @@ test_unit() {
   systemd-analyze security --offline=true --no-pager --threshold=5 "$unit" | grep -v '^✓'
 }
 
-test_manual() {
-  diff <(list_printed_messages) <(list_explained_messages)
-  need mandoc
-  mandoc -T lint -W warning "$manual"
-}
+test_manual() { diff <(list_printed_messages) <(list_explained_messages); }
 
 "test_$2"

@@ -15,6 +15,7 @@ constexpr std::size_t very_long = 8U << 20U;
 
 const string first = updates + "2020a.9.0";
 const string second = updates + "2020a.10.0";
+const string cut_name = "%n\n%s" + string(999, 'y');
 
 // An update goes by the name of its directory, whatever its files say.
 entries update(const string& path) {
@@ -27,7 +28,6 @@ entries links(const string& path) {
 
 const entries system_links = link_to(zoneinfo, system_zoneinfo) + gone(icutz);
 const entries default_zone = link_to(zone, zoneinfo + "/America/Los_Angeles");
-const entries no_latest = gone(latest);
 
 // A system partition of 2019c and two updates, of which the second is the latest.
 const entries on_system = file(version, "2019c") + file(schema, "44l") +
@@ -37,23 +37,27 @@ const entries on_system = file(version, "2019c") + file(schema, "44l") +
 const entries on_first = on_system + links(first);
 const entries on_second = on_system + links(second);
 
-const string invalid = "Invalid current symlinks; resetting to system partition";
-const string given_up = "Symlink points at data incompatible with installed system";
-const string unable = "Unable to locate data; resetting to system partition";
-const string no_zone = "localtime link invalid; resetting to America/Los_Angeles";
-const string to_tokyo = "Correcting localtime link to " + zoneinfo + "/Asia/Tokyo";
-const string not_migrated = "Could not migrate /var/db/icutz to /var/db/timezone/icutz";
-const string no_icutz_unlink = "unlink of ICU softlink failed";
-
-const string unparsed = "Cannot parse version string ";
-const string no_results = ", results.size() = 0";
-
-string refuse(const string& one, const string& other) {
-  return "New update not compatible or older version: " + one + " vs. " + other;
+// What it says.
+report say(const string& warning) { return {warning}; }
+const report invalid = say("Invalid current symlinks; resetting to system partition");
+const report given_up = say("Symlink points at data incompatible with installed system");
+const report unable = say("Unable to locate data; resetting to system partition");
+const report no_zone = say("localtime link invalid; resetting to America/Los_Angeles");
+const report not_migrated = say("Could not migrate /var/db/icutz to /var/db/timezone/icutz");
+report bad_link(const string& target) { return say("Bad zoneinfo link " + target); }
+report correct(const string& target) { return say("Correcting localtime link to " + target); }
+report no_schema(const string& path) { return say("No ICU schema found for " + path); }
+report fail_to_read(const string& path) { return say("read_symlink: " + path); }
+report fail_to_remove(const string& path) { return say("remove: could not remove " + path); }
+report fail_to_link(const string& path, const string& target) {
+  return say("create_symlink: from " + path + " to " + target);
 }
-
-string fail_to_link(const string& path, const string& target) {
-  return "create_symlink: from " + path + " to " + target;
+report refuse(const string& latest_name, const string& current_name) {
+  return say("New update not compatible or older version: " + latest_name + " vs. " + current_name);
+}
+report unparsed(const string& name) {
+  const string warning = "Cannot parse version string " + name;
+  return {warning + ", results.size() = 0", warning};
 }
 
 }  // namespace
@@ -68,105 +72,103 @@ const std::vector<whole_start> starts = {
      .changes = links(second) + file(marker, "") + file(record, "2020a.9.0_2020a.10.0")},
     {.name = "nothing new, and the marker of the last start",
      .before = on_second + file(marker, "") + file(record, "a_b"),
-     .says = {refuse("2020a.10.0", "2020a.10.0")},
+     .says = refuse("2020a.10.0", "2020a.10.0"),
      .changes = gone(marker)},
     {.name = "a system upgraded past the update",
      .before = on_second + file(version, "2020b"),
-     .says = {given_up, refuse("2020a.10.0", "2020a.10.0")},
+     .says = given_up + refuse("2020a.10.0", "2020a.10.0"),
      .changes = system_links + file(marker, "")},
     {.name = "a system upgraded past both updates; a marker that cannot be looked at",
      .before = on_first + file(version, "2020b"),
-     .says = {given_up, "Cannot touch file " + marker},
+     .says = given_up + say("Cannot touch file " + marker),
      .changes = links(second) + file(marker, "") + file(record, "2020b.1.0_2020a.10.0"),
      .tracing = {"-P", marker, "-e", "inject=/fstat:error=EIO"}},
     {.name = "a system upgraded to another ICU format",
      .before = on_second + file(version, "2019e") + file(schema, "45l"),
-     .says = {given_up, refuse("2020a.10.0", "2020a.10.0")},
+     .says = given_up + refuse("2020a.10.0", "2020a.10.0"),
      .changes = system_links + file(marker, "")},
     {.name = "an incompatible update",
      .before = on_first + gone(second + "/icutz") + file(second + "/icutz/icutz44b.dat", ""),
-     .says = {refuse("2020a.10.0", "2020a.9.0")}},
+     .says = refuse("2020a.10.0", "2020a.9.0")},
     {.name = "an update of the system's version, then a newer one; a marker that cannot be closed",
      .before = on_system + update(updates + "2019c.1.0") + links(updates + "2019c.1.0") +
                file(version, "\n \v\f2019c\t2020b") + file(schema, "\n44l\r\n44b"),
-     .says = {"Cannot touch file " + marker},
+     .says = say("Cannot touch file " + marker),
      .changes = links(second) + file(marker, "") + file(record, "2019c.1.0_2020a.10.0"),
      .tracing = {"-P", marker, "-e", "inject=close:error=EIO"}},
-    {.name = "an older update; a legacy link to nowhere; a zone beside the link",
-     .before = on_second + link_to(latest, first) + link_to(legacy_icutz, "nowhere") +
+    {.name = "an older update; both ICU links; a zone beside the link",
+     .before = on_second + link_to(latest, first) + link_to(legacy_icutz, "/usr/share/icu") +
                link_to(zone, zoneinfo + ".old"),
-     .says = {refuse("2020a.9.0", "2020a.10.0")}},
+     .says = refuse("2020a.9.0", "2020a.10.0"),
+     .changes = gone(legacy_icutz)},
     {.name = "updates that are gone; a legacy link to nowhere; a relative zone",
      .before = on_first + gone(first) + gone(second) + link_to(legacy_icutz, "nowhere") +
-               link_to(zone, "zoneinfo/UTC"),
-     .says = {"No ICU schema found for " + first, given_up, "No ICU schema found for " + second,
-              refuse("2020a.10.0", "2020a.9.0"), no_zone},
+               link_to(zone, "../usr/share/zoneinfo/../../.." + zoneinfo),
+     .says = no_schema(first) + given_up + no_schema(second) + refuse("2020a.10.0", "2020a.9.0") +
+             no_zone,
      .changes = system_links + default_zone + file(marker, "") + gone(legacy_icutz)},
     {.name = "no links",
      .before = on_system + gone(zoneinfo) + gone(zone),
-     .says = {"Bad zoneinfo link ", invalid, no_zone},
+     .says = bad_link("") + invalid + no_zone,
      .changes = links(second) + default_zone + file(record, "2019c.1.0_2020a.10.0")},
     {.name = "a zoneinfo link to neither kind of data set; no update; a zone cut short",
-     .before = on_first + no_latest + link_to(zoneinfo, "/usr/share/%s%n") +
+     .before = on_first + gone(latest) + link_to(zoneinfo, "/usr/share/%s%n") +
                link_to(zone, "/var/db/timezone/zoneinf"),
-     .says = {"Bad zoneinfo link /usr/share/%s%n", invalid, no_zone},
+     .says = bad_link("/usr/share/%s%n") + invalid + no_zone,
      .changes = system_links + default_zone},
     {.name = "a latest update elsewhere; a zone by the name of the system's own directory",
-     .before = on_first + link_to(latest, "%s%n") + link_to(zone, system_zoneinfo + "/Asia/Tokyo"),
-     .says = {"olm_dataset::create_components: bad path %s%n", unable,
-              "Correcting localtime link to " + zoneinfo + ".default/Asia/Tokyo", no_zone},
+     .before = on_first + link_to(latest, "%s%n") + link_to(zone, system_zoneinfo + "/%s%n"),
+     .says = say("olm_dataset::create_components: bad path %s%n") + unable +
+             correct(zoneinfo + ".default/%s%n") + no_zone,
      .changes = system_links + default_zone},
     {.name = "a latest update that is no link, found before the missing zoneinfo link",
      .before = on_first + gone(zoneinfo) + file(latest, "") + file(zone, ""),
-     .says = {"read_symlink: " + latest, unable, "read_symlink: " + zone, no_zone},
+     .says = fail_to_read(latest) + unable + fail_to_read(zone) + no_zone,
      .changes = system_links + default_zone},
-    {.name = "a system partition without data",
-     .before = on_first + gone(system_zoneinfo) + gone("/usr/share/icu"),
-     .says = {unparsed + ".1.0" + no_results, unparsed + ".1.0", given_up,
-              unparsed + ".1.0" + no_results, unparsed + ".1.0", refuse("2020a.10.0", "2020a.9.0")},
-     .changes = system_links + file(marker, "")},
 
     // What earlier systems left behind, and the zone
     {.name = "an ICU link of earlier systems",
-     .before = on_system + no_latest + link_to(legacy_icutz, "../../usr/share/icu") +
+     .before = on_system + gone(latest) + link_to(legacy_icutz, "../../usr/share/icu") +
                folder("/var/db/icu"),
      .changes = gone(legacy_icutz) + gone("/var/db/icu") + link_to(icutz, "../../usr/share/icu")},
-    {.name = "both ICU links",
-     .before = on_first + no_latest + link_to(legacy_icutz, "/usr/share/icu"),
-     .changes = gone(legacy_icutz)},
     {.name = "a zone among the system's own",
-     .before = on_system + no_latest + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
-     .says = {to_tokyo},
+     .before = on_system + gone(latest) + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = correct(zoneinfo + "/Asia/Tokyo"),
      .changes = link_to(zone, zoneinfo + "/Asia/Tokyo")},
 
     // What fails
     {.name = "a directory in the ICU link's place, which keeps the legacy link as it is",
      .before =
          on_first + gone(icutz) + file(icutz + "/kept", "") + link_to(legacy_icutz, "nowhere"),
-     .says = {"remove: could not remove " + icutz, no_icutz_unlink,
-              fail_to_link(icutz, second + "/icutz"), unable, "remove: could not remove " + icutz,
-              no_icutz_unlink},
+     .says = fail_to_remove(icutz) + say("unlink of ICU softlink failed") +
+             fail_to_link(icutz, second + "/icutz") + unable + fail_to_remove(icutz) +
+             say("unlink of ICU softlink failed"),
      .changes = link_to(zoneinfo, system_zoneinfo)},
     {.name = "a directory in the zoneinfo link's place, which keeps the ICU link as it is",
      .before = on_first + gone(zoneinfo) + file(zoneinfo + "/kept", ""),
-     .says = {"read_symlink: " + zoneinfo, invalid, "remove: could not remove " + zoneinfo,
-              "Unlink of zoneinfo softlink failed", fail_to_link(zoneinfo, system_zoneinfo), unable,
-              "remove: could not remove " + zoneinfo, "Unlink of zoneinfo softlink failed",
-              fail_to_link(zoneinfo, system_zoneinfo)},
+     .says = fail_to_read(zoneinfo) + invalid + fail_to_remove(zoneinfo) +
+             say("Unlink of zoneinfo softlink failed") + fail_to_link(zoneinfo, system_zoneinfo) +
+             unable + fail_to_remove(zoneinfo) + say("Unlink of zoneinfo softlink failed") +
+             fail_to_link(zoneinfo, system_zoneinfo),
+     .ends = "exit 1"},
+    {.name = "no directory for the links",
+     .before = on_system + gone("/var/db/timezone"),
+     .says = bad_link("") + invalid + fail_to_link(zoneinfo, system_zoneinfo) + unable +
+             fail_to_link(zoneinfo, system_zoneinfo),
      .ends = "exit 1"},
     {.name = "directories in the places of the old links, the marker and the record",
      .before = on_first + gone(icutz) + folder(legacy_icutz) + file("/var/db/icu/kept", "") +
                file(marker + "/kept", "") + folder(record),
-     .says = {"read_symlink: /var/db/icutz", not_migrated, "remove: could not remove /var/db/icutz",
-              "Could not remove /var/db/icutz", "remove: could not remove /var/db/icutz",
-              no_icutz_unlink, "Cannot touch file " + marker},
+     .says = fail_to_read(legacy_icutz) + not_migrated + fail_to_remove(legacy_icutz) +
+             say("Could not remove /var/db/icutz") + fail_to_remove(legacy_icutz) +
+             say("unlink of ICU softlink failed") + say("Cannot touch file " + marker),
      .changes = links(second)},
     {.name = "links that can be removed but not made",
-     .before = on_system + no_latest + link_to(legacy_icutz, "/usr/share/icu") +
+     .before = on_system + gone(latest) + link_to(legacy_icutz, "/usr/share/icu") +
                link_to(icutz, "nowhere") + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
-     .says = {fail_to_link(icutz, "/usr/share/icu"), not_migrated, to_tokyo,
-              fail_to_link(zone, zoneinfo + "/Asia/Tokyo"), no_zone,
-              fail_to_link(zone, zoneinfo + "/America/Los_Angeles")},
+     .says = fail_to_link(icutz, "/usr/share/icu") + not_migrated +
+             correct(zoneinfo + "/Asia/Tokyo") + fail_to_link(zone, zoneinfo + "/Asia/Tokyo") +
+             no_zone + fail_to_link(zone, zoneinfo + "/America/Los_Angeles"),
      .changes = gone(legacy_icutz) + gone(zone),
      .ends = "exit 1",
      .tracing = {"-e", "inject=/^symlink:error=EROFS"}},
@@ -182,30 +184,20 @@ const std::vector<whole_start> starts = {
      .tracing = {"-e", "inject=/^write:error=EFBIG:signal=XFSZ"}},
     {.name = "a number of 8 MB",
      .before = on_first + file(version, string(very_long, '1') + "c"),
-     .says = {unable},
+     .says = unable,
      .ends = "exit 1"},
-    {.name = "bytes that are no letters, or white space elsewhere",
-     .before = on_system + file(version, "%s\xA0\x85\0%n"s),
-     .says = {unparsed + "%s\xA0\x85" + no_results, unparsed + "%s\xA0\x85",
-              unparsed + "%s\xA0\x85" + no_results, unparsed + "%s\xA0\x85"},
+    {.name = "no ICU data, and a version with bytes that are letters or white space elsewhere",
+     .before = on_system + gone("/usr/share/icu") + gone(second + "/icutz") +
+               file(version, "%s\xA0\x85\0%n"s),
+     .says = unparsed("%s\xA0\x85") + unparsed("%s\xA0\x85") + no_schema(second),
      .changes = links(second) + file(record, "%s\xA0\x85\0%n.1.0_2020a.10.0"s)},
-    {.name = "names that are formats of two lines",
-     .before = on_system + update(updates + "%s%n\n%d") + links(updates + "%s%n\n%d") +
-               link_to(latest, updates + "%n\n") + link_to(zone, "/usr/share/zoneinfo/%s%n"),
-     .says = {unparsed + "%s%n\n%d" + no_results, unparsed + "%s%n\n%d", given_up,
-              unparsed + "%n\n" + no_results, unparsed + "%n\n",
-              "No ICU schema found for " + updates + "%n\n", refuse("%n\n", "%s%n\n%d"),
-              "Correcting localtime link to " + zoneinfo + "/%s%n", no_zone},
-     .changes = system_links + default_zone + file(marker, "")},
-    {.name = "links of 4095 bytes, of which 1024 count",
-     .before = on_system + link_to(zoneinfo, updates + string(4066, 'x') + "/zoneinfo") +
-               link_to(latest, updates + string(4075, 'y')) +
-               link_to(zone, "/usr/share/zoneinfo" + string(4076, 'z')),
-     .says = {"Bad zoneinfo link " + updates + string(1004, 'x'), invalid,
-              unparsed + string(1004, 'y') + no_results, unparsed + string(1004, 'y'),
-              "No ICU schema found for " + updates + string(1004, 'y'),
-              refuse(string(1004, 'y'), "2019c.1.0"),
-              "Correcting localtime link to " + zoneinfo + string(1005, 'z'), no_zone},
+    {.name = "links of 4095 bytes, of which 1024 count, with names that are formats of two lines",
+     .before = on_system + link_to(zoneinfo, updates + "%n\n%s" + string(4061, 'x') + "/zoneinfo") +
+               link_to(latest, updates + "%n\n%s" + string(4070, 'y')) +
+               link_to(zone, "/usr/share/zoneinfo%n\n%s" + string(4071, 'z')),
+     .says = bad_link(updates + "%n\n%s" + string(999, 'x')) + invalid + unparsed(cut_name) +
+             no_schema(updates + cut_name) + refuse(cut_name, "2019c.1.0") +
+             correct(zoneinfo + "%n\n%s" + string(1000, 'z')) + no_zone,
      .changes = system_links + default_zone},
 };
 
@@ -213,8 +205,7 @@ TEST(start, each_case) {
   for (const auto& row : starts) {
     SCOPED_TRACE(row.name);
     lay_out(row.before);
-    report heard = row.says;
-    heard.push_back(row.ends);
+    const report heard = row.says + report{row.ends};
     EXPECT_EQ(start(row.tracing), heard);
     EXPECT_EQ(look(), change(change({}, row.before), row.changes));
   }
