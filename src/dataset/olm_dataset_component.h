@@ -11,8 +11,10 @@ class olm_dataset_component {
   // another data set. Each class says what decides, and what it prints. Throws nothing.
   [[nodiscard]] virtual bool compatible_schema(const olm_dataset_component& other) const = 0;
 
-  // Re-points this component's link at its directory: removes the old link, then makes the new one.
-  // Prints warnings for what fails and throws the errno of a link that cannot be made.
+  // Makes this component's link say that this data set is in use: removes the old link, then makes
+  // one to its directory, if programs are to find this data through a link at all (the system
+  // partition's ICU data get none). Prints warnings for what fails and throws the errno of a link
+  // that cannot be made.
   virtual void install_link() const = 0;
 
   std::string dataset_path;  // the owning data set's path; empty for the system partition
