@@ -51,15 +51,13 @@ std::ptrdiff_t count_descriptors() {
 }
 
 TEST(file_operations, on_each_kind_of_entry) {
-  lay_out(file(at::marker, "") + link_to(at::latest, at::marker) + link_to(at::zone, "nowhere"));
+  lay_out(file(at::marker, "") + link_to(at::latest, at::marker) + link_to(at::zone, at::zone));
   EXPECT_TRUE(fs::exists(at::latest));
   EXPECT_FALSE(fs::exists(at::zone));
   EXPECT_EQ(fs::read_symlink(at::icutz), "");
   fs::remove(at::icutz + "/missing");
-  EXPECT_EQ(hear([] { static_cast<void>(fs::read_symlink(at::marker)); }),
-            (report{"read_symlink: " + at::marker, thrown(EINVAL)}));
-  EXPECT_EQ(hear([] { fs::remove(at::base); }),
-            (report{"remove: could not remove " + at::base, thrown(EISDIR)}));
+  EXPECT_EQ(hear([] { static_cast<void>(fs::read_symlink(at::zone + "/x")); }),
+            (report{"read_symlink: " + at::zone + "/x", thrown(ELOOP)}));
   EXPECT_EQ(hear([] { fs::remove(at::marker + "/x"); }),
             (report{"remove: could not remove " + at::marker + "/x", thrown(ENOTDIR)}));
   EXPECT_EQ(hear([] { fs::create_symlink("%s", at::zone); }),
@@ -171,11 +169,16 @@ TEST(protection_class, is_recorded_and_keeps_errno_true) {
   EXPECT_EQ(std::filesystem::status(at::marker).permissions(), std::filesystem::perms(0666));
   for (const string& path : {at::base, at::updates, at::marker})
     EXPECT_EQ(get_protection_class(path), attributes ? "D" : " ") << path;
-  // No attributes there.
-  ASSERT_EQ(mount("ramfs", at::updates.c_str(), "ramfs", 0, nullptr), 0);
-  EXPECT_EQ(open_marker(at::updates + "new"), EXDEV);
+  fs::remove(at::marker);
+  EXPECT_EQ(open_marker(at::marker), EXDEV);
   EXPECT_EQ(open_marker(at::base + "missing/new"), ENOENT);
   EXPECT_EQ(count_descriptors(), descriptors);
+  // No attributes there.
+  ASSERT_EQ(mount("ramfs", at::updates.c_str(), "ramfs", 0, nullptr), 0);
+  const olm_descriptor opened(open(at::updates.c_str(), O_RDONLY));
+  errno = EXDEV;
+  EXPECT_EQ(fcntl(opened.get(), F_SETPROTECTIONCLASS, PROTECTION_CLASS_D), 0);
+  EXPECT_EQ(errno, EXDEV);
   EXPECT_EQ(fcntl(-1, F_SETPROTECTIONCLASS, PROTECTION_CLASS_D), -1);
   EXPECT_EQ(errno, EBADF);
   lay_out({});

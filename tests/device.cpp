@@ -98,7 +98,8 @@ device look() {
 
 report start(std::vector<std::string> tracing) {
   // A leak checker cannot do its work in a traced process.
-  const auto tracer = {"strace", "-E", "ASAN_OPTIONS=detect_leaks=0", "-o", "/dev/null"};
+  const auto tracer = {"strace", "--quiet=path-resolution",    "-o", "/dev/null",
+                       "-E",     "ASAN_OPTIONS=detect_leaks=0"};
   if (!tracing.empty()) tracing.insert(tracing.begin(), tracer.begin(), tracer.end());
   tracing.emplace_back(PROGRAM);
   std::vector<char*> command;
