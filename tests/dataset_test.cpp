@@ -126,18 +126,20 @@ TEST(olm_dataset, is_compared_and_named) {
   odd.components.pop_back();
   EXPECT_FALSE(odd.compatible_with(system));
   EXPECT_FALSE(system.compatible_with(odd));
-  for (const string& bad : {at::updates, at::latest, at::system_zoneinfo, string("2019d.1.0")})
+  for (const string& bad : {at::updates, at::latest, at::system_zoneinfo, string("2019d.1.0")}) {
     EXPECT_EQ(hear([&] { static_cast<void>(olm_dataset(bad)); }),
               (report{"olm_dataset::create_components: bad path " + bad, "badpath"}));
+  }
 }
 
 TEST(olm_dataset, path_from_link) {
   EXPECT_EQ(dataset_path_from_link(update + "/a/b"), update + "/a");
   EXPECT_EQ(dataset_path_from_link(at::updates + "x/"), at::updates + "x");
   for (const string& bad : {string(), update, at::updates, at::updates + "/zoneinfo",
-                            "/tmp" + update, at::system_zoneinfo + "/"})
+                            "/tmp" + update, at::system_zoneinfo + "/"}) {
     EXPECT_EQ(hear([&] { static_cast<void>(dataset_path_from_link(bad)); }),
               (report{"Bad zoneinfo link " + bad, "int -1"}));
+  }
 }
 
 // The class recorded at `path`, or a blank.
@@ -147,8 +149,8 @@ string get_protection_class(const string& path) {
   return letter;
 }
 
-// How open_dprotected_np leaves an errno that was EXDEV.
-int open_marker(const string& path) {
+// What open_dprotected_np makes of an errno that was EXDEV.
+int get_errno_after_opening(const string& path) {
   errno = EXDEV;
   const olm_descriptor opened(
       open_dprotected_np(path.c_str(), O_CREAT | O_RDWR, PROTECTION_CLASS_D, 0, 0666));
@@ -170,8 +172,8 @@ TEST(protection_class, is_recorded_and_keeps_errno_true) {
   for (const string& path : {at::base, at::updates, at::marker})
     EXPECT_EQ(get_protection_class(path), attributes ? "D" : " ") << path;
   fs::remove(at::marker);
-  EXPECT_EQ(open_marker(at::marker), EXDEV);
-  EXPECT_EQ(open_marker(at::base + "missing/new"), ENOENT);
+  EXPECT_EQ(get_errno_after_opening(at::marker), EXDEV);
+  EXPECT_EQ(get_errno_after_opening(at::base + "missing/new"), ENOENT);
   EXPECT_EQ(count_descriptors(), descriptors);
   // No attributes there.
   ASSERT_EQ(mount("ramfs", at::updates.c_str(), "ramfs", 0, nullptr), 0);

@@ -5,6 +5,7 @@
 #include <sys/mount.h>
 #include <sys/wait.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <filesystem>
@@ -35,6 +36,7 @@ report listen(const std::function<std::string()>& action) {
   for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
     const std::string warning = text.substr(at + name.size());
     const std::size_t end = warning.rfind(": ");
+    // One that lacks the text of errno is passed on with all that surrounds it.
     heard.insert(heard.begin(), end == std::string::npos ? text : warning.substr(0, end));
   }
   if (text.size() > 1) heard.insert(heard.begin(), text);
@@ -102,14 +104,14 @@ report start(std::vector<std::string> tracing) {
                        "-E",     "ASAN_OPTIONS=detect_leaks=0"};
   if (!tracing.empty()) tracing.insert(tracing.begin(), tracer.begin(), tracer.end());
   tracing.emplace_back(PROGRAM);
-  std::vector<char*> command;
-  for (std::string& word : tracing) command.push_back(word.data());
-  command.push_back(nullptr);
+  std::vector<char*> command(tracing.size() + 1);
+  std::transform(tracing.begin(), tracing.end(), command.begin(),
+                 [](std::string& word) { return word.data(); });
   return listen([&] {
     pid_t process = 0;
     int status = 0;
-    char** const no_environment = &command.back();
-    posix_spawnp(&process, command[0], nullptr, nullptr, command.data(), no_environment);
+    // The command's end is also an empty environment.
+    posix_spawnp(&process, command[0], nullptr, nullptr, command.data(), &command.back());
     waitpid(process, &status, 0);
     return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
                              : "signal " + std::to_string(WTERMSIG(status));

@@ -50,7 +50,7 @@ link_targets heal() {
   return {};
 }
 
-bool has(const std::string& text, const char* part) { return text.find(part) != text.npos; }
+bool has(const std::string& in, const char* text) { return in.find(text) != std::string::npos; }
 
 // The calls on the device's files that a start makes, as strace prints them, each with what
 // strace needs to find it again. No call of a start closes what is not open.
