@@ -116,6 +116,7 @@ TEST(olm_dataset, is_compared_and_named) {
   EXPECT_TRUE(olm_dataset("").same_path(system));
   EXPECT_TRUE(olm_dataset("").compatible_with(system));
   EXPECT_FALSE(olm_dataset(update).compatible_with(system));
+  EXPECT_TRUE(olm_zoneinfo().compatible_schema(olm_icu()));
   olm_dataset odd(update);
   odd.path.back() = '1';
   EXPECT_FALSE(odd.same_path(olm_dataset(update)));

@@ -176,14 +176,14 @@ const std::vector<whole_start> starts = {
      .tracing = {"-e", "inject=/^symlink:error=EROFS"}},
     {.name = "warnings that nobody reads any more",
      .before = on_system + gone(zoneinfo),
-     .changes = links(second) + file(record, ""),
-     .tracing = {"-e", "inject=write:error=EPIPE:signal=PIPE"}},
+     .changes = links(second) + file(record, "2019c.1.0_2020a.10.0"),
+     .tracing = {"-P", "/proc/self/fd/2", "-e", "inject=write:error=EPIPE:signal=PIPE"}},
 
     // Nonsense
     {.name = "a version of 8 MB, and a limit to the size of files",
      .before = on_system + file(version, "2019" + string(very_long, 'z')),
      .changes = links(second) + file(record, ""),
-     .tracing = {"-e", "inject=/^write:error=EFBIG:signal=XFSZ"}},
+     .tracing = {"-P", record, "-e", "inject=/^write:error=EFBIG:signal=XFSZ"}},
     {.name = "a number of 8 MB",
      .before = on_first + file(version, string(very_long, '1') + "c"),
      .says = unable,
