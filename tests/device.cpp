@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
@@ -26,20 +27,22 @@ constexpr std::string_view arrow = "-> ";
 constexpr const char* directory = "(directory)";
 constexpr const char* nothing = "(nothing)";
 
-// Takes down what `action`, which gives how it ended, writes on the standard error stream.
-report listen(const std::function<std::string()>& action) {
+// Takes down what `action`, which gives how it ended, writes on the standard error stream. Of the
+// text of errno behind each warning, one that begins with `cut` is left out.
+report listen(const std::string& cut, const std::function<std::string()>& action) {
   const std::string name = "\ntzdata-select: ";
   testing::internal::CaptureStderr();
   report heard = {action()};
   std::string text = "\n";
   text += testing::internal::GetCapturedStderr();
+  text.pop_back();
   for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
     const std::string warning = text.substr(at + name.size());
-    const std::size_t end = warning.rfind(": ");
-    // One that lacks the text of errno is passed on with all that surrounds it.
-    heard.insert(heard.begin(), end == std::string::npos ? text : warning.substr(0, end));
+    // One that lacks such a text altogether is passed on with all that surrounds it.
+    const bool is_whole = warning.find(": ") != std::string::npos;
+    heard.insert(heard.begin(), is_whole ? warning.substr(0, warning.rfind(": " + cut)) : text);
   }
-  if (text.size() > 1) heard.insert(heard.begin(), text);
+  if (!text.empty()) heard.insert(heard.begin(), text);
   return heard;
 }
 
@@ -107,7 +110,7 @@ report start(std::vector<std::string> tracing) {
   std::vector<char*> command(tracing.size() + 1);
   std::transform(tracing.begin(), tracing.end(), command.begin(),
                  [](std::string& word) { return word.data(); });
-  return listen([&] {
+  return listen("", [&] {
     pid_t process = 0;
     int status = 0;
     // The command's end is also an empty environment.
@@ -119,13 +122,16 @@ report start(std::vector<std::string> tracing) {
 }
 
 report hear(const std::function<void()>& action) {
-  return listen([&]() -> std::string {
+  return listen(strerror(0), [&]() -> std::string {
     try {
+      errno = 0;
       action();
     } catch (int value) {
       return "int " + std::to_string(value);
-    } catch (const std::exception& failure) {
-      return failure.what();
+    } catch (const std::invalid_argument& failure) {
+      return std::string("invalid_argument ") + failure.what();
+    } catch (const std::out_of_range&) {
+      return "out_of_range";
     }
     return "done";
   });

@@ -51,13 +51,14 @@ void lay_out(const entries& contents);
 // The device as it is.
 device look();
 
-// What came of an action: its warnings, without the program's name and the text of errno, then how
-// it ended. A line that lacks the name belongs to the warning before it.
+// What came of an action: its warnings, without the program's name, then how it ended. A line that
+// lacks the name belongs to the warning before it.
 using report = std::vector<std::string>;
 
-// Starts the built program, under strace if there are `tracing` options for it; ends with its
-// status, such as "exit 0", or with "signal 11".
+// Starts the built program, under strace if there are `tracing` options for it. The warnings lack
+// the text of errno; it ends with its status, such as "exit 0", or with "signal 11".
 report start(std::vector<std::string> tracing = {});
 
-// Runs `action` in this process; ends with what it threw, such as "int 17", or with "done".
+// Runs `action` in this process, with no error before it: a warning ends with the text of errno
+// only if a call failed. It ends with what it threw, such as "int 17", or with "done".
 report hear(const std::function<void()>& action);

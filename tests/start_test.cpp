@@ -47,7 +47,6 @@ const report not_migrated = say("Could not migrate /var/db/icutz to /var/db/time
 report bad_link(const string& target) { return say("Bad zoneinfo link " + target); }
 report correct(const string& target) { return say("Correcting localtime link to " + target); }
 report no_schema(const string& path) { return say("No ICU schema found for " + path); }
-report fail_to_read(const string& path) { return say("read_symlink: " + path); }
 report fail_to_remove(const string& path) { return say("remove: could not remove " + path); }
 report fail_to_link(const string& path, const string& target) {
   return say("create_symlink: from " + path + " to " + target);
@@ -125,7 +124,7 @@ const std::vector<whole_start> starts = {
      .changes = system_links + default_zone},
     {.name = "a latest update that is no link, found before the missing zoneinfo link",
      .before = on_first + gone(zoneinfo) + file(latest, "") + file(zone, ""),
-     .says = fail_to_read(latest) + unable + fail_to_read(zone) + no_zone,
+     .says = say("read_symlink: " + latest) + unable + say("read_symlink: " + zone) + no_zone,
      .changes = system_links + default_zone},
 
     // What earlier systems left behind, and the zone
@@ -148,7 +147,7 @@ const std::vector<whole_start> starts = {
      .changes = link_to(zoneinfo, system_zoneinfo)},
     {.name = "a directory in the zoneinfo link's place, which keeps the ICU link as it is",
      .before = on_first + gone(zoneinfo) + file(zoneinfo + "/kept", ""),
-     .says = fail_to_read(zoneinfo) + invalid + fail_to_remove(zoneinfo) +
+     .says = say("read_symlink: " + zoneinfo) + invalid + fail_to_remove(zoneinfo) +
              say("Unlink of zoneinfo softlink failed") + fail_to_link(zoneinfo, system_zoneinfo) +
              unable + fail_to_remove(zoneinfo) + say("Unlink of zoneinfo softlink failed") +
              fail_to_link(zoneinfo, system_zoneinfo),
@@ -161,7 +160,7 @@ const std::vector<whole_start> starts = {
     {.name = "directories in the places of the old links, the marker and the record",
      .before = on_first + gone(icutz) + folder(legacy_icutz) + file("/var/db/icu/kept", "") +
                file(marker + "/kept", "") + folder(record),
-     .says = fail_to_read(legacy_icutz) + not_migrated + fail_to_remove(legacy_icutz) +
+     .says = say("read_symlink: " + legacy_icutz) + not_migrated + fail_to_remove(legacy_icutz) +
              say("Could not remove /var/db/icutz") + fail_to_remove(legacy_icutz) +
              say("unlink of ICU softlink failed") + say("Cannot touch file " + marker),
      .changes = links(second)},

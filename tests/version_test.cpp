@@ -20,9 +20,9 @@ TEST(olm_version, parse) {
       {"02019cc.007", "2019 cc 7 -1", "done"},
       {"2147483647z.0.2147483647", "2147483647 z 0 2147483647", "done"},
       // The fields before the number that does not fit are set, the others are as they were.
-      {"2147483648c", "7 x 8 9", "stoi"},
-      {"2019c.99999999999", "2019 c 8 9", "stoi"},
-      {"2019c.1.99999999999", "2019 c 1 9", "stoi"},
+      {"2147483648c", "7 x 8 9", "out_of_range"},
+      {"2019c.99999999999", "2019 c 8 9", "out_of_range"},
+      {"2019c.1.99999999999", "2019 c 1 9", "out_of_range"},
   };
   for (const auto& [text, expected, end] : accepted) {
     SCOPED_TRACE(text);
