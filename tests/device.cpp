@@ -111,11 +111,10 @@ report start(std::vector<std::string> tracing) {
   std::transform(tracing.begin(), tracing.end(), command.begin(),
                  [](std::string& word) { return word.data(); });
   return listen("", [&] {
-    pid_t process = 0;
-    int status = 0;
+    pid_t pid = 0;
     // The command's end is also an empty environment.
-    posix_spawnp(&process, command[0], nullptr, nullptr, command.data(), &command.back());
-    waitpid(process, &status, 0);
+    int status = posix_spawnp(&pid, command[0], nullptr, nullptr, command.data(), &command.back());
+    waitpid(pid, &status, 0);
     return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
                              : "signal " + std::to_string(WTERMSIG(status));
   });

@@ -123,7 +123,7 @@ const std::vector<whole_start> starts = {
              correct(zoneinfo + ".default/%s%n") + no_zone,
      .changes = system_links + default_zone},
     {.name = "a latest update that is no link, found before the missing zoneinfo link",
-     .before = on_first + gone(zoneinfo) + file(latest, "") + file(zone, ""),
+     .before = on_first + gone(zoneinfo) + file(latest, "") + folder(zone),
      .says = say("read_symlink: " + latest) + unable + say("read_symlink: " + zone) + no_zone,
      .changes = system_links + default_zone},
 
