@@ -45,6 +45,7 @@ using device = std::map<std::string, std::string>;
 device change(device before, const entries& changes);
 
 // Puts a new device with `contents` in place of the one that was there; nothing is deleted for it.
+// Its ICU data files are of a size and a time that 32 bits do not hold, and count as empty.
 // Throws std::logic_error outside a private root, std::system_error when the kernel refuses.
 void lay_out(const entries& contents);
 
@@ -55,8 +56,9 @@ device look();
 // lacks the name belongs to the warning before it.
 using report = std::vector<std::string>;
 
-// Starts the built program, under strace if there are `tracing` options for it. The warnings lack
-// the text of errno; it ends with its status, such as "exit 0", or with "signal 11".
+// Starts the built program, under strace if there are `tracing` options for it. The environment may
+// name another `PROGRAM`, and the `EMULATOR` that it needs. The warnings lack the text of errno; it
+// ends with its status, such as "exit 0", or with "signal 11".
 report start(std::vector<std::string> tracing = {});
 
 // Runs `action` in this process, with no error before it: a warning ends with the text of errno

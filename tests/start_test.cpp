@@ -81,7 +81,7 @@ const std::vector<whole_start> starts = {
      .before = on_first + file(version, "2020b"),
      .says = given_up + say("Cannot touch file " + marker),
      .changes = links(second) + file(marker, "") + file(record, "2020b.1.0_2020a.10.0"),
-     .tracing = {"-P", marker, "-e", "inject=/fstat:error=EIO"}},
+     .tracing = {"-P", marker, "-e", "inject=/stat:error=EIO"}},
     {.name = "a system upgraded to another ICU format; an ICU link that cannot be removed",
      .before = on_second + file(version, "2019e") + file(schema, "45l"),
      .says = given_up + fail_to_remove(icutz) + say("unlink of ICU softlink failed") +
