@@ -1,11 +1,11 @@
 #!/bin/bash
-# The manual explains each message that there is, in these words, and no other.
+# The manual explains each message that a start has, in these words, and no other.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
 # Whichever way something may be printed.
 list_printed_messages() {
-  cat src/*/*.{h,cpp} | tr '\n' ' ' |
+  cat src/{driver,dataset,fs}/*.{h,cpp} | tr '\n' ' ' |
     grep -oE '((warnx?|errx?|perror|puts|printf)\(|cerr <<)[^";]*"[^"]*"' | sed 's/^[^"]*//' | sort
 }
 

@@ -1,6 +1,9 @@
 // Whole starts of the built program, a row each: a name, a device, what the program says, and what
-// it changes. device.h tells what an entry is.
+// it changes. device.h tells what an entry is. Then what tzdata-status says of such devices.
 #include <gtest/gtest.h>
+
+#include <cstdio>
+#include <filesystem>
 
 #include "starts.h"
 
@@ -210,4 +213,88 @@ TEST(start, each_case) {
     EXPECT_EQ(start(row.tracing), heard);
     EXPECT_EQ(look(), change(change({}, row.before), row.changes));
   }
+}
+
+namespace {
+
+// What tzdata-status prints, line by line and without `margin`, and its exit status.
+report ask(const string& arguments = "", const string& margin = "none", const string& tracer = "") {
+  report answer = {""};
+  FILE* const output = popen((tracer + STATUS " " + arguments).c_str(), "r");
+  for (int byte = 0; (byte = getc(output)) != EOF;) {
+    if (byte == '\n') {
+      answer.emplace_back();
+    } else {
+      answer.back() += static_cast<char>(byte);
+      if (answer.back() == margin) answer.back().clear();
+    }
+  }
+  answer.back() = "exit " + std::to_string(WEXITSTATUS(pclose(output)));
+  return answer;
+}
+
+// What a link holds, or "none".
+string follow(const string& path) {
+  const auto there = look();
+  const auto found = there.find(path);
+  return found != there.end() && found->second.starts_with("-> ") ? found->second.substr(3)
+                                                                  : "none";
+}
+
+}  // namespace
+
+TEST(status, forecasts_each_start) {
+  for (const auto& row : starts) {
+    SCOPED_TRACE(row.name);
+    lay_out(row.before);
+    const device before = look();
+    const string links = follow(zoneinfo) + follow(icutz);
+    const report answer = ask();
+    EXPECT_EQ(look(), before);
+    start();
+    EXPECT_EQ(answer.back(), follow(zoneinfo) + follow(icutz) == links ? "exit 0" : "exit 1");
+    EXPECT_TRUE(answer[4].starts_with("next start ") &&
+                answer[4].ends_with(": " + follow(zoneinfo)))
+        << answer[4];
+  }
+}
+
+// Whether a start would use an update, on a device that uses the first one; each answer without
+// what all its lines begin with.
+TEST(status, judges_an_update) {
+  const string closed = updates + "2020b.1.0";
+  lay_out(on_first + update(closed) + update(updates + "02020a.9.0") + folder(first + ".0") +
+          file(updates + "2018b.1.0/zoneinfo/+VERSION", "") +
+          file(updates + "2018b.1.0/icutz/icutz45l.dat", ""));
+  std::filesystem::permissions(closed + "/icutz/icutz44l.dat", std::filesystem::perms(0640));
+  const string current = " the current data set 2020a.9.0";
+  const string no_version_file = "it has no zoneinfo/+VERSION, which a start does not ask for";
+  const std::pair<string, report> rows[] = {
+      {second, {"the update 2020a.10.0 is fit, and newer than the current data set", "exit 0"}},
+      {first, {"the update 2020a.9.0 is" + current, "exit 1"}},
+      {first + ".0",
+       {"the update 2020a.9.0.0 has a name that is no version",
+        "the update 2020a.9.0.0 has no ICU data, the system partition 44l",
+        "the update 2020a.9.0.0 is older than" + current, no_version_file, "exit 1"}},
+      {closed,
+       {"the update 2020b.1.0 has icutz44l.dat, which others may not read, the system partition "
+        "44l",
+        "exit 1"}},
+      {updates + "02020a.9.0", {"the update 02020a.9.0 is not newer than" + current, "exit 1"}},
+      {updates + "2018b.1.0",
+       {"the update 2018b.1.0 has schema 45l, the system partition 44l",
+        "the update 2018b.1.0 is older than" + current, "exit 1"}},
+      {updates + "2147483648a",
+       {"a version has a number beyond 32 bits", no_version_file, "exit 1"}},
+      {"tz", {"the update is not below " + updates, no_version_file, "exit 1"}},
+  };
+  for (const auto& [path, reasons] : rows) {
+    const string used = reasons.back() == "exit 0" ? "would be used     " : "would be refused  ";
+    EXPECT_EQ(ask(path, string(18, ' ')), report{used + path} + reasons);
+  }
+  EXPECT_EQ(ask("one two"), report{"exit 2"});
+  const string tracer =
+      "ASAN_OPTIONS=detect_leaks=0 strace -o /dev/null -e inject=/access:error=EACCES ";
+  EXPECT_EQ(ask(second, "", tracer).back(), "exit 2");
+  EXPECT_EQ(ask("", "", tracer).back(), "exit 2");
 }

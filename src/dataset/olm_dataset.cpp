@@ -59,7 +59,7 @@ void olm_dataset::install_links() const {
 
 std::string olm_dataset::get_name() const { return name; }
 
-std::string latest_dataset_path() { return fs::read_symlink("/var/db/timezone/tz_latest"); }
+std::string latest_dataset_path() { return fs::read_symlink(latest_link); }
 
 std::string dataset_path_from_link(const std::string& target) {
   if (is_below_update_area(target)) {

@@ -10,6 +10,9 @@
 // The directory below which each update has a directory of its own, named by its version.
 inline constexpr const char* update_area = "/var/db/timezone/tz/";
 
+// The link that names the newest update.
+inline constexpr const char* latest_link = "/var/db/timezone/tz_latest";
+
 // One complete time-zone data set: the system partition's, or an update. It is whole once it is
 // built, and nothing changes it afterwards.
 class olm_dataset {
@@ -53,8 +56,8 @@ class olm_dataset {
   void create_components();
 };
 
-// The target of the link /var/db/timezone/tz_latest, which names the newest update; empty when
-// there is no such link. Nothing checks it here. Prints and throws what fs::read_symlink does.
+// The target of latest_link; empty when there is no such link. Nothing checks it here. Prints and
+// throws what fs::read_symlink does.
 [[nodiscard]] std::string latest_dataset_path();
 
 // The path of the data set whose zone files a zoneinfo link with `target` leads to; empty for the

@@ -50,13 +50,13 @@ std::string find_schema(std::string directory) {
 olm_icu::olm_icu() : olm_icu(std::string()) {}
 
 olm_icu::olm_icu(const std::string& path)
-    : olm_dataset_component(path), directory(path.empty() ? "/usr/share/icu" : path + "/icutz") {
+    : olm_dataset_component(path), directory(path.empty() ? system_icu_directory : path + "/icutz") {
   initialize();
 }
 
 void olm_icu::initialize() {
   if (dataset_path.empty()) {
-    schema = read_first_word(directory + "/icutzformat.txt");
+    schema = read_first_word(directory + schema_file);
     return;
   }
   schema = find_schema(directory);

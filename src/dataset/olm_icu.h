@@ -11,6 +11,10 @@ inline constexpr const char* icutz_link = "/var/db/timezone/icutz";
 // Where that link stood in earlier systems.
 inline constexpr const char* legacy_icutz_link = "/var/db/icutz";
 
+// Where the system partition keeps its ICU data, and the file there that holds their schema.
+inline constexpr const char* system_icu_directory = "/usr/share/icu";
+inline constexpr const char* schema_file = "/icutzformat.txt";
+
 // The ICU data of a data set. Its schema is the data's format on disk, such as 44l.
 class olm_icu final : public olm_dataset_component {
  public:

@@ -13,7 +13,7 @@ olm_zoneinfo::olm_zoneinfo(const std::string& path)
   read_version();
 }
 
-void olm_zoneinfo::read_version() { version_text = read_first_word(directory + "/+VERSION"); }
+void olm_zoneinfo::read_version() { version_text = read_first_word(directory + version_file); }
 
 std::string olm_zoneinfo::get_version_text() const { return version_text; }
 

@@ -11,8 +11,6 @@
 
 namespace {
 
-constexpr const char* localtime_link = "/var/db/timezone/localtime";
-
 // How a link into the system's own zone files begins. Matches longer names too.
 constexpr const char* system_prefix = "/usr/share/zoneinfo";
 

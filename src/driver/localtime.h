@@ -1,6 +1,9 @@
 #pragma once
 
-// Makes sure that /var/db/timezone/localtime, the device's local zone, goes through the zoneinfo
+// The link to the device's local zone.
+inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
+
+// Makes sure that the local zone's link goes through the zoneinfo
 // link, so that it follows whichever data set is in use. A link that does is left alone, whether or
 // not its zone exists. One into the system's own zone files is corrected, if the zone exists in the
 // data set in use: prints "Correcting localtime link to ...". Anything else becomes a link to the

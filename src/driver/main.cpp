@@ -9,6 +9,7 @@
 #include <string>
 
 #include "dataset/olm_dataset.h"
+#include "dataset/olm_selection.h"
 #include "driver/housekeeping.h"
 #include "driver/localtime.h"
 
@@ -18,18 +19,6 @@ namespace {
 // install_links do.
 void reset_to_system_partition() { olm_dataset().install_links(); }
 
-// The path of the data set that the links designate. Links that cannot be understood are reset,
-// with a warning; throws only if that fails.
-std::string read_current_path() {
-  try {
-    return current_dataset_path();
-  } catch (...) {
-    warn("Invalid current symlinks; resetting to system partition");
-    reset_to_system_partition();
-    return {};
-  }
-}
-
 // Leaves the names of the data set that was in use and of the update that took over from it, for
 // whoever asks later. A record that cannot be written is done without.
 void write_version_record(const olm_dataset& before, const olm_dataset& after) {
@@ -37,34 +26,32 @@ void write_version_record(const olm_dataset& before, const olm_dataset& after) {
   record << before.get_name() + "_" + after.get_name();
 }
 
-// Keeps the current data set while it is fit to stand in for the system partition's, then installs
-// the latest update if it is fit and newer. Throws whatever building or installing one throws.
-void settle_data_set() {
-  const olm_dataset system;
-  const std::string latest_path = latest_dataset_path();
-  const std::string current_path = read_current_path();
-  const olm_dataset current(current_path);
+// What a start does, and says, at each turn that the choice takes.
+class olm_start final : public olm_selection {
+  void reset_bad_link() override {
+    warn("Invalid current symlinks; resetting to system partition");
+    reset_to_system_partition();
+  }
 
-  const bool current_is_unfit = !current.compatible_with(system) || system > current;
-  if (current_is_unfit) {
+  void give_up(const olm_dataset& /*current*/, const olm_dataset& /*system*/) override {
     warn("Symlink points at data incompatible with installed system");
     reset_to_system_partition();
     touch_needs_cleanup();
   }
-  const olm_dataset& in_use = current_is_unfit ? system : current;
 
-  if (latest_path.empty()) return;
-  const olm_dataset latest(latest_path);
-  // Against the current data set, even if that has just been given up.
-  if (latest.compatible_with(system) && latest > current) {
+  void install(const olm_dataset& latest, const olm_dataset& in_use,
+               const olm_dataset& system) override {
     latest.install_links();
     if (!in_use.same_path(system)) touch_needs_cleanup();
     write_version_record(in_use, latest);
-  } else {
+  }
+
+  void refuse(const olm_dataset& latest, const olm_dataset& current,
+              const olm_dataset& /*system*/) override {
     warn("New update not compatible or older version: %s vs. %s", latest.get_name().c_str(),
          current.get_name().c_str());
   }
-}
+};
 
 }  // namespace
 
@@ -82,7 +69,7 @@ int main() {
     static_cast<void>(std::remove(needs_cleanup_marker));
     static_cast<void>(std::remove("/var/db/icu"));
     try {
-      settle_data_set();
+      olm_start().select();
     } catch (...) {
       warn("Unable to locate data; resetting to system partition");
       reset_to_system_partition();

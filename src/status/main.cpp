@@ -1,0 +1,282 @@
+// Tells which data sets a device has and what its next start will do about them. Changes nothing.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cctype>
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+#include <stdexcept>
+#include <string>
+#include <system_error>
+#include <utility>
+#include <vector>
+
+#include "dataset/olm_icu.h"
+#include "dataset/olm_selection.h"
+#include "dataset/olm_zoneinfo.h"
+#include "driver/localtime.h"
+#include "fs/file_operations.h"
+
+namespace {
+
+namespace files = std::filesystem;
+using std::string;
+
+constexpr int cannot_be_told = 2;
+
+// There only if the directory is.
+constexpr const char* directory_of_links = "/var/db/timezone/.";
+
+// What is at `path`, not what a link there leads to.
+files::file_type look_at(const char* path) {
+  std::error_code error;
+  return files::symlink_status(path, error).type();
+}
+
+// Empty also for what is no link.
+string read_target(const char* path) {
+  try {
+    return fs::read_symlink(path);
+  } catch (int) {
+    return {};
+  }
+}
+
+const olm_icu& get_icu(const olm_dataset& data) {
+  return dynamic_cast<const olm_icu&>(*data.components.back());
+}
+
+string name_schema(const olm_dataset& data) {
+  const string& schema = get_icu(data).schema;
+  return schema.empty() ? "none" : schema;
+}
+
+// What an update that does not fit has for ICU data.
+string describe_icu(const olm_dataset& update) {
+  if (!get_icu(update).schema.empty()) return "schema " + get_icu(update).schema;
+  std::error_code error;
+  for (const auto& there : files::directory_iterator(get_icu(update).directory, error)) {
+    if (there.path().extension() == ".dat" &&
+        (there.status(error).permissions() & files::perms::others_read) == files::perms::none)
+      return there.path().filename().string() + ", which others may not read";
+  }
+  return "no ICU data";
+}
+
+// What was thrown.
+string describe_failure() {
+  try {
+    throw;
+  } catch (const std::invalid_argument&) {
+    return string("the update is not below ") + update_area;
+  } catch (const std::out_of_range&) {
+    return "a version has a number beyond 32 bits";
+  } catch (const std::runtime_error& obstacle) {
+    return obstacle.what();
+  } catch (int error) {
+    return string(latest_link) + " cannot be read: " + std::strerror(error);
+  }
+}
+
+// The next start, gone through without doing anything. It takes for granted that a link can be made
+// and removed where no directory is in the way.
+class olm_forecast final : public olm_selection {
+ public:
+  // `update`, if there is one, stands for what tz_latest names. Throws only for want of memory.
+  explicit olm_forecast(const char* update = nullptr) : update_(update) {
+    const string before = zoneinfo + '\n' + icutz;
+    migrate_icutz();
+    try {
+      try {
+        select();
+        if (decision.empty()) decision = "keeps " + olm_dataset(current_dataset_path()).name;
+      } catch (...) {
+        reasons.push_back(describe_failure());
+        reset();
+      }
+    } catch (...) {
+      decision = "fails, and leaves the zoneinfo link as it is";
+      if (reasons.back() != describe_failure()) reasons.push_back(describe_failure());
+    }
+    changes_links = zoneinfo + '\n' + icutz != before;
+  }
+
+  string decision;  // what the start does, such as "keeps 2020a.1.0"
+  std::vector<string> reasons;
+  string zoneinfo = read_target(zoneinfo_link);  // where the links will lead
+  string icutz = read_target(icutz_link);
+  bool changes_links = false;
+  bool installs_update = false;
+
+ private:
+  [[nodiscard]] string find_latest() override {
+    string latest = update_ != nullptr ? update_ : olm_selection::find_latest();
+    if (latest.empty()) reasons.emplace_back("there is no latest update");
+    return latest;
+  }
+
+  void reset_bad_link() override {
+    reasons.push_back("the zoneinfo link leads to " + (zoneinfo.empty() ? "nothing" : zoneinfo));
+    reset();
+  }
+
+  void give_up(const olm_dataset& current, const olm_dataset& system) override {
+    explain_schema("the current data set " + current.name, current, system);
+    if (system > current)
+      reasons.push_back("the current data set " + current.name +
+                        " is older than the system partition " + system.name);
+    reset();
+  }
+
+  void install(const olm_dataset& latest, const olm_dataset& /*in_use*/,
+               const olm_dataset& /*system*/) override {
+    reasons.push_back("the update " + latest.name + " is fit, and newer than the current data set");
+    point_links(latest);
+    installs_update = true;
+  }
+
+  void refuse(const olm_dataset& latest, const olm_dataset& current,
+              const olm_dataset& system) override {
+    const string what = "the update " + latest.name;
+    if (latest.version == olm_version()) reasons.push_back(what + " has a name that is no version");
+    explain_schema(what, latest, system);
+    if (latest > current) return;
+    const char* const than = current > latest            ? " is older than "
+                             : latest.same_path(current) ? " is "
+                                                         : " is not newer than ";
+    reasons.push_back(what + than + "the current data set " + current.name);
+  }
+
+  void explain_schema(const string& what, const olm_dataset& data, const olm_dataset& system) {
+    if (data.compatible_with(system)) return;
+    reasons.push_back(what + " has " + describe_icu(data) + ", the system partition " +
+                      name_schema(system));
+  }
+
+  // As migrate_icutz_link does it.
+  void migrate_icutz() {
+    const string target = read_target(legacy_icutz_link);
+    if (target.empty() || !fs::exists(legacy_icutz_link) || !fs::exists(directory_of_links) ||
+        look_at(icutz_link) != files::file_type::not_found)
+      return;
+    icutz = target;
+    reasons.emplace_back("the ICU link of earlier systems moves to its new place");
+  }
+
+  void reset() { point_links(olm_dataset()); }
+
+  // As install_links does it.
+  void point_links(const olm_dataset& data) {
+    const bool is_update = !data.path.empty();
+    decision = (is_update ? "installs " : "falls back to the system partition, ") + data.name;
+    if (!fs::exists(directory_of_links)) throw std::runtime_error("no directory for the links");
+    if (look_at(zoneinfo_link) == files::file_type::directory)
+      throw std::runtime_error("a directory is in the place of the zoneinfo link");
+    zoneinfo = olm_zoneinfo(data.path).directory;
+    if (look_at(icutz_link) != files::file_type::directory) {
+      icutz = is_update ? get_icu(data).directory : "";
+    } else if (is_update) {
+      throw std::runtime_error("a directory is in the place of the ICU link");
+    }
+  }
+
+  const char* update_;
+};
+
+// Names come from outside: a control byte shows as a question mark, so that a line stays one.
+void print_row(const char* label, string text) {
+  for (char& byte : text) {
+    if (std::iscntrl(static_cast<unsigned char>(byte)) != 0) byte = '?';
+  }
+  std::printf("%-17s %s\n", label, text.c_str());
+}
+
+void print_reasons(const char* label, const olm_forecast& forecast) {
+  for (const auto& reason : forecast.reasons) print_row(std::exchange(label, ""), reason);
+}
+
+string pad(string text, std::size_t width) {
+  text.resize(std::max(text.size(), width), ' ');
+  return text;
+}
+
+string describe(const string& path) {
+  try {
+    const olm_dataset data(path);
+    return pad(data.name, 12) + " schema " + pad(name_schema(data), 5) + " " +
+           (path.empty() ? system_zoneinfo_directory : path);
+  } catch (...) {
+    return "cannot be used: " + path;
+  }
+}
+
+string describe_current() {
+  try {
+    return describe(current_dataset_path());
+  } catch (int) {
+    return "none";
+  }
+}
+
+// What a start reads and this user may not, if anything. `update` is the latest one.
+string find_unreadable(const string& update) {
+  for (const string& path : {string(system_zoneinfo_directory) + version_file,
+                             string(system_icu_directory) + schema_file,
+                             string(zoneinfo_link) + "/../icutz", update + "/icutz"}) {
+    if (access(path.c_str(), R_OK) != 0 && errno == EACCES) return path;
+  }
+  return {};
+}
+
+// Gives the exit status, as does judge.
+int tell() {
+  const olm_forecast forecast;
+  const string latest = read_target(latest_link);
+  string zone = read_target(localtime_link);
+  const string prefix = string(zoneinfo_link) + "/";
+  if (zone.starts_with(prefix)) zone.erase(0, prefix.size());
+  print_row("system partition", describe(""));
+  print_row("current", describe_current());
+  print_row("latest update", latest.empty() ? "none" : describe(latest));
+  print_row("local zone", zone.empty() ? "none" : zone);
+  print_row("next start",
+            forecast.decision + ": " + (forecast.zoneinfo.empty() ? "none" : forecast.zoneinfo));
+  print_reasons("because", forecast);
+  if (!forecast.changes_links) return 0;
+  print_row("provided that", "links can be made and removed: nothing here tries to write");
+  return 1;
+}
+
+// Whether the next start would install the update at `path`.
+int judge(const char* path) {
+  const olm_forecast forecast(path);
+  print_row(forecast.installs_update ? "would be used" : "would be refused", path);
+  print_reasons("", forecast);
+  if (!fs::exists(olm_zoneinfo(path).directory + version_file))
+    print_row("", string("it has no zoneinfo") + version_file + ", which a start does not ask for");
+  return forecast.installs_update ? 0 : 1;
+}
+
+}  // namespace
+
+int main(int count, char* arguments[]) {
+  if (count > 2 || (count == 2 && arguments[1][0] == '-')) {
+    std::fputs("usage: tzdata-status [UPDATE]\n", stderr);
+    return cannot_be_told;
+  }
+  // What a start would warn of is told in other words: a directory takes nothing.
+  if (std::freopen("/", "r", stderr) == nullptr) return cannot_be_told;
+  try {
+    const string unreadable = find_unreadable(count == 2 ? arguments[1] : latest_link);
+    if (!unreadable.empty()) print_row("cannot be told", "you may not read " + unreadable);
+    const int status = !unreadable.empty() ? cannot_be_told
+                       : count == 2        ? judge(arguments[1])
+                                           : tell();
+    return std::fflush(stdout) == 0 ? status : cannot_be_told;
+  } catch (...) {
+    return cannot_be_told;  // memory ran out
+  }
+}
