@@ -9,6 +9,7 @@
 #include <array>
 #include <cerrno>
 #include <chrono>
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
@@ -29,7 +30,7 @@ constexpr std::string_view arrow = "-> ";
 constexpr const char* directory = "(directory)";
 constexpr const char* nothing = "(nothing)";
 
-constexpr const char* icu_data = ".dat";
+constexpr std::uintmax_t large = 3ULL << 30U;
 
 // Takes down what `action`, which gives how it ended, writes on the standard error stream. Of the
 // text of errno behind each warning, one that begins with `cut` is left out.
@@ -86,8 +87,8 @@ void lay_out(const entries& contents) {
     } else if (what != directory) {
       std::ofstream(path) << what;
     }
-    if (path.extension() == icu_data && files::is_regular_file(path)) {
-      files::resize_file(path, 3ULL << 30U);
+    if (path.extension() == ".dat" && files::is_regular_file(path)) {
+      files::resize_file(path, large);
       files::last_write_time(path, files::last_write_time(path) + std::chrono::years(34));
     }
   }
@@ -99,7 +100,7 @@ device look() {
     for (const auto& there : files::recursive_directory_iterator(root)) {
       if (there.is_symlink()) {
         found[there.path()] = std::string(arrow) + files::read_symlink(there).string();
-      } else if (there.path().extension() == icu_data) {
+      } else if (there.is_regular_file() && there.file_size() == large) {
         found[there.path()];
       } else if (!there.is_directory()) {
         found[there.path()] = (std::ostringstream() << std::ifstream(there.path()).rdbuf()).str();
@@ -116,8 +117,8 @@ report start(std::vector<std::string> tracing) {
   const auto tracer = {"strace", "--quiet=path-resolution",    "-o", "/dev/null",
                        "-E",     "ASAN_OPTIONS=detect_leaks=0"};
   if (!tracing.empty()) tracing.insert(tracing.begin(), tracer.begin(), tracer.end());
-  const char* emulator = std::getenv("EMULATOR");
-  const char* program = std::getenv("PROGRAM");
+  const char* emulator = std::getenv("TZDATA_SELECT_EMULATOR");
+  const char* program = std::getenv("TZDATA_SELECT_PROGRAM");
   if (emulator != nullptr) tracing.emplace_back(emulator);
   tracing.emplace_back(program != nullptr ? program : PROGRAM);
   std::vector<char*> command(tracing.size() + 1);

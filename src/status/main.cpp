@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
+#include <span>
 #include <stdexcept>
 #include <string>
 #include <system_error>
@@ -45,23 +46,26 @@ string read_target(const char* path) {
   }
 }
 
+string or_none(string text) {
+  if (text.empty()) text = "none";
+  return text;
+}
+
 const olm_icu& get_icu(const olm_dataset& data) {
   return dynamic_cast<const olm_icu&>(*data.components.back());
 }
 
-string name_schema(const olm_dataset& data) {
-  const string& schema = get_icu(data).schema;
-  return schema.empty() ? "none" : schema;
-}
+string name_schema(const olm_dataset& data) { return or_none(get_icu(data).schema); }
 
 // What an update that does not fit has for ICU data.
 string describe_icu(const olm_dataset& update) {
   if (!get_icu(update).schema.empty()) return "schema " + get_icu(update).schema;
   std::error_code error;
   for (const auto& there : files::directory_iterator(get_icu(update).directory, error)) {
-    if (there.path().extension() == ".dat" &&
-        (there.status(error).permissions() & files::perms::others_read) == files::perms::none)
-      return there.path().filename().string() + ", which others may not read";
+    const bool is_closed =
+        (there.status(error).permissions() & files::perms::others_read) == files::perms::none;
+    const string name = there.path().filename();
+    if (is_closed && name.ends_with(".dat")) return name + ", which others may not read";
   }
   return "no ICU data";
 }
@@ -85,8 +89,8 @@ string describe_failure() {
 // and removed where no directory is in the way.
 class olm_forecast final : public olm_selection {
  public:
-  // `update`, if there is one, stands for what tz_latest names. Throws only for want of memory.
-  explicit olm_forecast(const char* update = nullptr) : update_(update) {
+  // `path`, if not empty, stands for what tz_latest names. Throws only for want of memory.
+  explicit olm_forecast(string path) : update(std::move(path)) {
     const string before = zoneinfo + '\n' + icutz;
     migrate_icutz();
     try {
@@ -99,11 +103,13 @@ class olm_forecast final : public olm_selection {
       }
     } catch (...) {
       decision = "fails, and leaves the zoneinfo link as it is";
-      if (reasons.back() != describe_failure()) reasons.push_back(describe_failure());
+      const string last = describe_failure();
+      if (reasons.back() != last) reasons.push_back(last);
     }
     changes_links = zoneinfo + '\n' + icutz != before;
   }
 
+  string update;
   string decision;  // what the start does, such as "keeps 2020a.1.0"
   std::vector<string> reasons;
   string zoneinfo = read_target(zoneinfo_link);  // where the links will lead
@@ -113,21 +119,21 @@ class olm_forecast final : public olm_selection {
 
  private:
   [[nodiscard]] string find_latest() override {
-    string latest = update_ != nullptr ? update_ : olm_selection::find_latest();
-    if (latest.empty()) reasons.emplace_back("there is no latest update");
-    return latest;
+    if (update.empty()) update = olm_selection::find_latest();
+    if (update.empty()) reasons.emplace_back("there is no latest update");
+    return update;
   }
 
   void reset_bad_link() override {
-    reasons.push_back("the zoneinfo link leads to " + (zoneinfo.empty() ? "nothing" : zoneinfo));
+    reasons.push_back("the zoneinfo link leads to no data set: " + or_none(zoneinfo));
     reset();
   }
 
   void give_up(const olm_dataset& current, const olm_dataset& system) override {
-    explain_schema("the current data set " + current.name, current, system);
-    if (system > current)
-      reasons.push_back("the current data set " + current.name +
-                        " is older than the system partition " + system.name);
+    const string what = "the current data set " + current.name;
+    const string older = what + " is older than the system partition " + system.name;
+    explain_schema(what, current, system);
+    if (system > current) reasons.push_back(older);
     reset();
   }
 
@@ -159,9 +165,8 @@ class olm_forecast final : public olm_selection {
   // As migrate_icutz_link does it.
   void migrate_icutz() {
     const string target = read_target(legacy_icutz_link);
-    if (target.empty() || !fs::exists(legacy_icutz_link) || !fs::exists(directory_of_links) ||
-        look_at(icutz_link) != files::file_type::not_found)
-      return;
+    if (!fs::exists(legacy_icutz_link) || !fs::exists(directory_of_links)) return;
+    if (target.empty() || look_at(icutz_link) != files::file_type::not_found) return;
     icutz = target;
     reasons.emplace_back("the ICU link of earlier systems moves to its new place");
   }
@@ -177,13 +182,12 @@ class olm_forecast final : public olm_selection {
       throw std::runtime_error("a directory is in the place of the zoneinfo link");
     zoneinfo = olm_zoneinfo(data.path).directory;
     if (look_at(icutz_link) != files::file_type::directory) {
-      icutz = is_update ? get_icu(data).directory : "";
+      icutz.clear();
+      if (is_update) icutz = get_icu(data).directory;
     } else if (is_update) {
       throw std::runtime_error("a directory is in the place of the ICU link");
     }
   }
-
-  const char* update_;
 };
 
 // Names come from outside: a control byte shows as a question mark, so that a line stays one.
@@ -206,8 +210,9 @@ string pad(string text, std::size_t width) {
 string describe(const string& path) {
   try {
     const olm_dataset data(path);
-    return pad(data.name, 12) + " schema " + pad(name_schema(data), 5) + " " +
-           (path.empty() ? system_zoneinfo_directory : path);
+    const string row = pad(data.name, 12) + " schema " + pad(name_schema(data), 5) + " ";
+    if (path.empty()) return row + system_zoneinfo_directory;
+    return row + path;
   } catch (...) {
     return "cannot be used: " + path;
   }
@@ -221,29 +226,30 @@ string describe_current() {
   }
 }
 
-// What a start reads and this user may not, if anything. `update` is the latest one.
-string find_unreadable(const string& update) {
-  for (const string& path : {string(system_zoneinfo_directory) + version_file,
-                             string(system_icu_directory) + schema_file,
-                             string(zoneinfo_link) + "/../icutz", update + "/icutz"}) {
-    if (access(path.c_str(), R_OK) != 0 && errno == EACCES) return path;
-  }
-  return {};
+string describe_latest() {
+  const string path = read_target(latest_link);
+  if (path.empty()) return "none";
+  return describe(path);
+}
+
+// Prints that the forecast cannot be told, and throws errno, if this user may not read `path`.
+void demand(const string& path) {
+  if (access(path.c_str(), R_OK) == 0 || errno != EACCES) return;
+  print_row("cannot be told", "you may not read " + path);
+  throw errno;
 }
 
 // Gives the exit status, as does judge.
 int tell() {
-  const olm_forecast forecast;
-  const string latest = read_target(latest_link);
+  const olm_forecast forecast("");
   string zone = read_target(localtime_link);
   const string prefix = string(zoneinfo_link) + "/";
   if (zone.starts_with(prefix)) zone.erase(0, prefix.size());
   print_row("system partition", describe(""));
   print_row("current", describe_current());
-  print_row("latest update", latest.empty() ? "none" : describe(latest));
-  print_row("local zone", zone.empty() ? "none" : zone);
-  print_row("next start",
-            forecast.decision + ": " + (forecast.zoneinfo.empty() ? "none" : forecast.zoneinfo));
+  print_row("latest update", describe_latest());
+  print_row("local zone", or_none(zone));
+  print_row("next start", forecast.decision + ": " + or_none(forecast.zoneinfo));
   print_reasons("because", forecast);
   if (!forecast.changes_links) return 0;
   print_row("provided that", "links can be made and removed: nothing here tries to write");
@@ -251,7 +257,7 @@ int tell() {
 }
 
 // Whether the next start would install the update at `path`.
-int judge(const char* path) {
+int judge(const string& path) {
   const olm_forecast forecast(path);
   print_row(forecast.installs_update ? "would be used" : "would be refused", path);
   print_reasons("", forecast);
@@ -263,20 +269,23 @@ int judge(const char* path) {
 }  // namespace
 
 int main(int count, char* arguments[]) {
-  if (count > 2 || (count == 2 && arguments[1][0] == '-')) {
-    std::fputs("usage: tzdata-status [UPDATE]\n", stderr);
+  const string update = count == 2 ? std::span(arguments, 2)[1] : "";
+  if (count > 2 || update.starts_with('-') || (count == 2 && update.empty())) {
+    static_cast<void>(std::fputs("usage: tzdata-status [UPDATE]\n", stderr));
     return cannot_be_told;
   }
   // What a start would warn of is told in other words: a directory takes nothing.
   if (std::freopen("/", "r", stderr) == nullptr) return cannot_be_told;
+  int status = cannot_be_told;
   try {
-    const string unreadable = find_unreadable(count == 2 ? arguments[1] : latest_link);
-    if (!unreadable.empty()) print_row("cannot be told", "you may not read " + unreadable);
-    const int status = !unreadable.empty() ? cannot_be_told
-                       : count == 2        ? judge(arguments[1])
-                                           : tell();
-    return std::fflush(stdout) == 0 ? status : cannot_be_told;
+    // Of all that a start reads, what an ordinary user may be barred from.
+    demand(string(system_zoneinfo_directory) + version_file);
+    demand(string(system_icu_directory) + schema_file);
+    demand(string(zoneinfo_link) + "/../icutz");
+    demand((update.empty() ? latest_link : update) + "/icutz");
+    status = update.empty() ? tell() : judge(update);
   } catch (...) {
-    return cannot_be_told;  // memory ran out
+    // It has been told, or memory ran out.
   }
+  return std::fflush(stdout) == 0 ? status : cannot_be_told;
 }
