@@ -58,7 +58,8 @@ using report = std::vector<std::string>;
 
 // Starts the built program, under strace if there are `tracing` options for it. The environment may
 // name another program (TZDATA_SELECT_PROGRAM), and the emulator that this needs
-// (TZDATA_SELECT_EMULATOR). The warnings lack the text of errno; it ends with its status, such as "exit 0", or with "signal 11".
+// (TZDATA_SELECT_EMULATOR). The warnings lack the text of errno; it ends with its status, such as
+// "exit 0", or with "signal 11".
 report start(std::vector<std::string> tracing = {});
 
 // Runs `action` in this process, with no error before it: a warning ends with the text of errno

@@ -275,18 +275,16 @@ TEST(status, judges_an_update) {
       {first, {"the update 2020a.9.0 is" + current, "exit 1"}},
       {first + ".0",
        {"the update 2020a.9.0.0 has a name that is no version",
-        "the update 2020a.9.0.0 has no ICU data, the system partition 44l",
-        "the update 2020a.9.0.0 is older than" + current, no_version_file, "exit 1"}},
-      {closed,
-       {"the update 2020b.1.0 has icutz44l.dat, which others may not read, the system partition "
-        "44l",
-        "exit 1"}},
+        "the update 2020a.9.0.0 has no ICU data", "the update 2020a.9.0.0 is older than" + current,
+        no_version_file, "exit 1"}},
+      {closed, {"the update 2020b.1.0 has icutz44l.dat, which others may not read", "exit 1"}},
       {updates + "02020a.9.0", {"the update 02020a.9.0 is not newer than" + current, "exit 1"}},
       {updates + "2018b.1.0",
        {"the update 2018b.1.0 has schema 45l, the system partition 44l",
         "the update 2018b.1.0 is older than" + current, "exit 1"}},
       {updates + "2147483648a",
-       {"a version has a number beyond 32 bits", no_version_file, "exit 1"}},
+       {"a number beyond 32 bits is in the version of " + updates + "2147483648a", no_version_file,
+        "exit 1"}},
       {"tz", {"the update is not below " + updates, no_version_file, "exit 1"}},
   };
   for (const auto& [path, reasons] : rows) {
@@ -296,8 +294,50 @@ TEST(status, judges_an_update) {
   for (const string bad : {"one two", "-h", "''"})
     EXPECT_EQ(ask(bad + " 2>&1"), (report{"usage: tzdata-status [UPDATE]", "exit 2"}));
   EXPECT_EQ(ask(">/dev/full"), report{"exit 2"});
+  // What an ordinary user may not read, each alone.
   const string tracer =
-      "ASAN_OPTIONS=detect_leaks=0 strace -o /dev/null -e inject=/access:error=EACCES ";
-  EXPECT_EQ(ask(second, "", tracer).back(), "exit 2");
-  EXPECT_EQ(ask("", "", tracer).back(), "exit 2");
+      "ASAN_OPTIONS=detect_leaks=0 strace -o /dev/null -e inject=/access:error=EACCES -P ";
+  for (const string& path : {version, schema, legacy_icutz, first + "/icutz", second + "/icutz"}) {
+    EXPECT_EQ(ask(second, "", tracer + path + " "),
+              (report{"cannot be told    you may not read " + path, "exit 2"}));
+  }
+}
+
+TEST(status, tells_of_a_device) {
+  const string older =
+      "the current data set 2020a.10.0 is older than the system partition 2020b.1.0";
+  lay_out(on_second + file(version, "2020b\n") + link_to(latest, updates + "2147483648a"));
+  EXPECT_EQ(
+      ask(),
+      (report{"system partition  2020b.1.0    schema 44l   /usr/share/zoneinfo.default",
+              "current           2020a.10.0   schema 44l   " + second,
+              "latest update     cannot be used: " + updates + "2147483648a",
+              "local zone        Asia/Tokyo",
+              "next start        falls back to the system partition, 2020b.1.0: " + system_zoneinfo,
+              "because           " + older,
+              "                  a number beyond 32 bits is in the version of " + updates +
+                  "2147483648a",
+              "provided that     links can be made and removed: nothing here tries to write",
+              "exit 1"}));
+  // The ICU link alone goes, with what stands in its place.
+  lay_out(on_system + file(icutz, "") + file(latest, "") + link_to(zone, "/\x1b") +
+          file(version, "9999999999a"));
+  EXPECT_EQ(
+      ask(),
+      (report{"system partition  cannot be used: /usr/share/zoneinfo.default",
+              "current           cannot be used: /usr/share/zoneinfo.default",
+              "latest update     none", "local zone        /?",
+              "next start        fails, and leaves the zoneinfo link as it is: " + system_zoneinfo,
+              "because           a number beyond 32 bits is in the version of " + system_zoneinfo,
+              "exit 0"}));
+  lay_out(on_system + file(icutz, "") + file(latest, "") + gone(zone));
+  EXPECT_EQ(
+      ask(),
+      (report{"system partition  2019c.1.0    schema 44l   /usr/share/zoneinfo.default",
+              "current           2019c.1.0    schema 44l   /usr/share/zoneinfo.default",
+              "latest update     none", "local zone        none",
+              "next start        falls back to the system partition, 2019c.1.0: " + system_zoneinfo,
+              "because           " + latest + ", or what it names, cannot be read",
+              "provided that     links can be made and removed: nothing here tries to write",
+              "exit 1"}));
 }

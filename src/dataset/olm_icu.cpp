@@ -50,7 +50,8 @@ std::string find_schema(std::string directory) {
 olm_icu::olm_icu() : olm_icu(std::string()) {}
 
 olm_icu::olm_icu(const std::string& path)
-    : olm_dataset_component(path), directory(path.empty() ? system_icu_directory : path + "/icutz") {
+    : olm_dataset_component(path),
+      directory(path.empty() ? system_icu_directory : path + "/icutz") {
   initialize();
 }
 

@@ -3,10 +3,10 @@
 // The link to the device's local zone.
 inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
 
-// Makes sure that the local zone's link goes through the zoneinfo
-// link, so that it follows whichever data set is in use. A link that does is left alone, whether or
-// not its zone exists. One into the system's own zone files is corrected, if the zone exists in the
-// data set in use: prints "Correcting localtime link to ...". Anything else becomes a link to the
-// default zone: prints "localtime link invalid; resetting to ...".
+// Makes sure that the local zone's link goes through the zoneinfo link, so that it follows
+// whichever data set is in use. A link that does is left alone, whether or not its zone exists. One
+// into the system's own zone files is corrected, if the zone exists in the data set in use: prints
+// "Correcting localtime link to ...". Anything else becomes a link to the default zone: prints
+// "localtime link invalid; resetting to ...".
 // Throws errno when the link to the default zone cannot be made; the link is then missing.
 void repair_localtime_link();

@@ -1,12 +1,10 @@
 // Tells which data sets a device has and what its next start will do about them. Changes nothing.
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cctype>
 #include <cerrno>
 #include <cstdio>
-#include <cstring>
 #include <filesystem>
 #include <span>
 #include <stdexcept>
@@ -55,33 +53,55 @@ const olm_icu& get_icu(const olm_dataset& data) {
   return dynamic_cast<const olm_icu&>(*data.components.back());
 }
 
-string name_schema(const olm_dataset& data) { return or_none(get_icu(data).schema); }
-
 // What an update that does not fit has for ICU data.
-string describe_icu(const olm_dataset& update) {
-  if (!get_icu(update).schema.empty()) return "schema " + get_icu(update).schema;
+string describe_icu(const olm_dataset& update, const olm_dataset& system) {
+  const olm_icu& icu = get_icu(update);
+  if (!icu.schema.empty())
+    return "schema " + icu.schema + ", the system partition " + or_none(get_icu(system).schema);
   std::error_code error;
-  for (const auto& there : files::directory_iterator(get_icu(update).directory, error)) {
+  for (const auto& there : files::directory_iterator(icu.directory, error)) {
     const bool is_closed =
         (there.status(error).permissions() & files::perms::others_read) == files::perms::none;
     const string name = there.path().filename();
-    if (is_closed && name.ends_with(".dat")) return name + ", which others may not read";
+    if (is_closed && name.starts_with("icutz") && name.ends_with(".dat"))
+      return name + ", which others may not read";
   }
   return "no ICU data";
 }
 
-// What was thrown.
-string describe_failure() {
+// The path of the current data set; empty also where the zoneinfo link cannot be understood.
+string find_current() {
+  try {
+    return current_dataset_path();
+  } catch (int) {
+    return {};
+  }
+}
+
+// Which of the data sets that are weighed against `update` has a number beyond 32 bits.
+string find_large_number(const string& update) {
+  for (const string& path : {string(), find_current()}) {
+    try {
+      olm_dataset{path};
+    } catch (const std::out_of_range&) {
+      return path.empty() ? system_zoneinfo_directory : path;
+    }
+  }
+  return update;
+}
+
+// What was thrown while `update` was weighed.
+string describe_failure(const string& update) {
   try {
     throw;
   } catch (const std::invalid_argument&) {
     return string("the update is not below ") + update_area;
   } catch (const std::out_of_range&) {
-    return "a version has a number beyond 32 bits";
+    return "a number beyond 32 bits is in the version of " + find_large_number(update);
   } catch (const std::runtime_error& obstacle) {
     return obstacle.what();
-  } catch (int error) {
-    return string(latest_link) + " cannot be read: " + std::strerror(error);
+  } catch (int) {
+    return string(latest_link) + ", or what it names, cannot be read";
   }
 }
 
@@ -89,38 +109,42 @@ string describe_failure() {
 // and removed where no directory is in the way.
 class olm_forecast final : public olm_selection {
  public:
-  // `path`, if not empty, stands for what tz_latest names. Throws only for want of memory.
-  explicit olm_forecast(string path) : update(std::move(path)) {
+  // `path`, if not empty, stands for what tz_latest names, and the reasons are for what becomes of
+  // that. Throws only for want of memory.
+  explicit olm_forecast(string path) : judges(!path.empty()), update(std::move(path)) {
     const string before = zoneinfo + '\n' + icutz;
     migrate_icutz();
     try {
       try {
         select();
+        if (update.empty()) reasons.emplace_back("there is no latest update");
         if (decision.empty()) decision = "keeps " + olm_dataset(current_dataset_path()).name;
       } catch (...) {
-        reasons.push_back(describe_failure());
+        reasons.push_back(describe_failure(update));
         reset();
       }
     } catch (...) {
       decision = "fails, and leaves the zoneinfo link as it is";
-      const string last = describe_failure();
+      const string last = describe_failure(update);
       if (reasons.back() != last) reasons.push_back(last);
     }
     changes_links = zoneinfo + '\n' + icutz != before;
   }
 
+  bool judges;
   string update;
   string decision;  // what the start does, such as "keeps 2020a.1.0"
   std::vector<string> reasons;
   string zoneinfo = read_target(zoneinfo_link);  // where the links will lead
-  string icutz = read_target(icutz_link);
+  // A file is no link, but goes like one.
+  string icutz =
+      look_at(icutz_link) == files::file_type::regular ? "a file" : read_target(icutz_link);
   bool changes_links = false;
   bool installs_update = false;
 
  private:
   [[nodiscard]] string find_latest() override {
     if (update.empty()) update = olm_selection::find_latest();
-    if (update.empty()) reasons.emplace_back("there is no latest update");
     return update;
   }
 
@@ -139,6 +163,7 @@ class olm_forecast final : public olm_selection {
 
   void install(const olm_dataset& latest, const olm_dataset& /*in_use*/,
                const olm_dataset& /*system*/) override {
+    if (judges) reasons.clear();
     reasons.push_back("the update " + latest.name + " is fit, and newer than the current data set");
     point_links(latest);
     installs_update = true;
@@ -147,6 +172,7 @@ class olm_forecast final : public olm_selection {
   void refuse(const olm_dataset& latest, const olm_dataset& current,
               const olm_dataset& system) override {
     const string what = "the update " + latest.name;
+    if (judges) reasons.clear();
     if (latest.version == olm_version()) reasons.push_back(what + " has a name that is no version");
     explain_schema(what, latest, system);
     if (latest > current) return;
@@ -157,9 +183,8 @@ class olm_forecast final : public olm_selection {
   }
 
   void explain_schema(const string& what, const olm_dataset& data, const olm_dataset& system) {
-    if (data.compatible_with(system)) return;
-    reasons.push_back(what + " has " + describe_icu(data) + ", the system partition " +
-                      name_schema(system));
+    if (!data.compatible_with(system))
+      reasons.push_back(what + " has " + describe_icu(data, system));
   }
 
   // As migrate_icutz_link does it.
@@ -210,11 +235,12 @@ string pad(string text, std::size_t width) {
 string describe(const string& path) {
   try {
     const olm_dataset data(path);
-    const string row = pad(data.name, 12) + " schema " + pad(name_schema(data), 5) + " ";
+    const string row =
+        pad(data.name, 12) + " schema " + pad(or_none(get_icu(data).schema), 5) + " ";
     if (path.empty()) return row + system_zoneinfo_directory;
     return row + path;
   } catch (...) {
-    return "cannot be used: " + path;
+    return "cannot be used: " + (path.empty() ? system_zoneinfo_directory : path);
   }
 }
 
@@ -232,9 +258,9 @@ string describe_latest() {
   return describe(path);
 }
 
-// Prints that the forecast cannot be told, and throws errno, if this user may not read `path`.
-void demand(const string& path) {
-  if (access(path.c_str(), R_OK) == 0 || errno != EACCES) return;
+// Prints that the forecast cannot be told, and throws errno, if this user may not look at `path`.
+void demand(const string& path, int mode) {
+  if (access(path.c_str(), mode) == 0 || errno != EACCES) return;
   print_row("cannot be told", "you may not read " + path);
   throw errno;
 }
@@ -261,7 +287,7 @@ int judge(const string& path) {
   const olm_forecast forecast(path);
   print_row(forecast.installs_update ? "would be used" : "would be refused", path);
   print_reasons("", forecast);
-  if (!fs::exists(olm_zoneinfo(path).directory + version_file))
+  if (!fs::exists(olm_zoneinfo(path).directory + version_file) && errno == ENOENT)
     print_row("", string("it has no zoneinfo") + version_file + ", which a start does not ask for");
   return forecast.installs_update ? 0 : 1;
 }
@@ -279,10 +305,11 @@ int main(int count, char* arguments[]) {
   int status = cannot_be_told;
   try {
     // Of all that a start reads, what an ordinary user may be barred from.
-    demand(string(system_zoneinfo_directory) + version_file);
-    demand(string(system_icu_directory) + schema_file);
-    demand(string(zoneinfo_link) + "/../icutz");
-    demand((update.empty() ? latest_link : update) + "/icutz");
+    demand(string(system_zoneinfo_directory) + version_file, R_OK);
+    demand(string(system_icu_directory) + schema_file, R_OK);
+    demand(legacy_icutz_link, F_OK);
+    demand(find_current() + "/icutz", R_OK | X_OK);
+    demand((update.empty() ? latest_link : update) + "/icutz", R_OK | X_OK);
     status = update.empty() ? tell() : judge(update);
   } catch (...) {
     // It has been told, or memory ran out.
