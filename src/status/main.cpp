@@ -63,8 +63,8 @@ string describe_icu(const olm_dataset& update, const olm_dataset& system) {
     const bool is_closed =
         (there.status(error).permissions() & files::perms::others_read) == files::perms::none;
     const string name = there.path().filename();
-    if (is_closed && name.starts_with("icutz") && name.ends_with(".dat"))
-      return name + ", which others may not read";
+    const bool has_name = name.starts_with("icutz") && name.ends_with(".dat");
+    if (is_closed && has_name) return name + ", which others may not read";
   }
   return "no ICU data";
 }
@@ -78,16 +78,25 @@ string find_current() {
   }
 }
 
-// Which of the data sets that are weighed against `update` has a number beyond 32 bits.
-string find_large_number(const string& update) {
-  for (const string& path : {string(), find_current()}) {
-    try {
-      olm_dataset{path};
-    } catch (const std::out_of_range&) {
-      return path.empty() ? system_zoneinfo_directory : path;
-    }
+string locate(const string& path) {
+  if (path.empty()) return system_zoneinfo_directory;
+  return path;
+}
+
+bool has_large_number(const string& path) {
+  try {
+    const olm_dataset data(path);
+    return false;
+  } catch (const std::out_of_range&) {
+    return true;
   }
-  return update;
+}
+
+// Which of the data sets that are weighed with `update` has a number beyond 32 bits.
+string find_large_number(const string& update) {
+  if (has_large_number("")) return locate("");
+  const string current = find_current();
+  return has_large_number(current) ? current : update;
 }
 
 // What was thrown while `update` was weighed.
@@ -190,7 +199,8 @@ class olm_forecast final : public olm_selection {
   // As migrate_icutz_link does it.
   void migrate_icutz() {
     const string target = read_target(legacy_icutz_link);
-    if (!fs::exists(legacy_icutz_link) || !fs::exists(directory_of_links)) return;
+    if (!fs::exists(legacy_icutz_link)) return;
+    if (!fs::exists(directory_of_links)) return;
     if (target.empty() || look_at(icutz_link) != files::file_type::not_found) return;
     icutz = target;
     reasons.emplace_back("the ICU link of earlier systems moves to its new place");
@@ -235,12 +245,10 @@ string pad(string text, std::size_t width) {
 string describe(const string& path) {
   try {
     const olm_dataset data(path);
-    const string row =
-        pad(data.name, 12) + " schema " + pad(or_none(get_icu(data).schema), 5) + " ";
-    if (path.empty()) return row + system_zoneinfo_directory;
-    return row + path;
+    return pad(data.name, 12) + " schema " + pad(or_none(get_icu(data).schema), 5) + " " +
+           locate(path);
   } catch (...) {
-    return "cannot be used: " + (path.empty() ? system_zoneinfo_directory : path);
+    return "cannot be used: " + locate(path);
   }
 }
 
@@ -287,7 +295,8 @@ int judge(const string& path) {
   const olm_forecast forecast(path);
   print_row(forecast.installs_update ? "would be used" : "would be refused", path);
   print_reasons("", forecast);
-  if (!fs::exists(olm_zoneinfo(path).directory + version_file) && errno == ENOENT)
+  const bool has_version = fs::exists(olm_zoneinfo(path).directory + version_file);
+  if (!has_version && errno == ENOENT)
     print_row("", string("it has no zoneinfo") + version_file + ", which a start does not ask for");
   return forecast.installs_update ? 0 : 1;
 }
@@ -309,7 +318,7 @@ int main(int count, char* arguments[]) {
     demand(string(system_icu_directory) + schema_file, R_OK);
     demand(legacy_icutz_link, F_OK);
     demand(find_current() + "/icutz", R_OK | X_OK);
-    demand((update.empty() ? latest_link : update) + "/icutz", R_OK | X_OK);
+    demand((update.empty() ? string(latest_link) : update) + "/icutz", R_OK | X_OK);
     status = update.empty() ? tell() : judge(update);
   } catch (...) {
     // It has been told, or memory ran out.
