@@ -319,7 +319,7 @@ TEST(status, tells_of_a_device) {
                   "2147483648a",
               "provided that     links can be made and removed: nothing here tries to write",
               "exit 1"}));
-  // The ICU link alone goes, with what stands in its place.
+  // Nothing can be weighed.
   lay_out(on_system + file(icutz, "") + file(latest, "") + link_to(zone, "/\x1b") +
           file(version, "9999999999a"));
   EXPECT_EQ(
@@ -330,6 +330,7 @@ TEST(status, tells_of_a_device) {
               "next start        fails, and leaves the zoneinfo link as it is: " + system_zoneinfo,
               "because           a number beyond 32 bits is in the version of " + system_zoneinfo,
               "exit 0"}));
+  // What stands in the ICU link's place is all that goes.
   lay_out(on_system + file(icutz, "") + file(latest, "") + gone(zone));
   EXPECT_EQ(
       ask(),
