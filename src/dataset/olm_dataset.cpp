@@ -1,7 +1,5 @@
 #include "dataset/olm_dataset.h"
 
-#include <err.h>
-
 #include <algorithm>
 #include <stdexcept>
 #include <string_view>
@@ -9,6 +7,7 @@
 
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
+#include "fs/device.h"
 #include "fs/file_operations.h"
 
 namespace {
@@ -34,7 +33,7 @@ void olm_dataset::create_components() {
   } else if (is_below_update_area(path)) {
     name = path.substr(update_area_length);
   } else {
-    warn("olm_dataset::create_components: bad path %s", path.c_str());
+    device::warn("olm_dataset::create_components: bad path %s", path.c_str());
     throw std::invalid_argument("badpath");
   }
   version.parse(name);
@@ -68,7 +67,7 @@ std::string dataset_path_from_link(const std::string& target) {
   } else if (target == system_zoneinfo_directory) {
     return {};
   }
-  warn("Bad zoneinfo link %s", target.c_str());
+  device::warn("Bad zoneinfo link %s", target.c_str());
   throw -1;
 }
 

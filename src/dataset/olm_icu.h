@@ -15,6 +15,10 @@ inline constexpr const char* legacy_icutz_link = "/var/db/icutz";
 inline constexpr const char* system_icu_directory = "/usr/share/icu";
 inline constexpr const char* schema_file = "/icutzformat.txt";
 
+// The schema in `name`, if that is the name of an ICU data file, such as icutz44l.dat; else empty.
+// Prints nothing.
+[[nodiscard]] std::string read_schema(const char* name);
+
 // The ICU data of a data set. Its schema is the data's format on disk, such as 44l.
 class olm_icu final : public olm_dataset_component {
  public:

@@ -1,12 +1,11 @@
 #include "dataset/olm_version.h"
 
-#include <err.h>
-
 #include <regex>
 #include <stdexcept>
 #include <tuple>
 
 #include "dataset/pattern.h"
+#include "fs/device.h"
 
 namespace {
 
@@ -21,8 +20,8 @@ std::smatch match_version(const std::string& text) {
   std::smatch results;
   const bool matched = std::regex_match(text, results, pattern);
   if (!matched || results.size() != sub_match_count) {
-    warn("Cannot parse version string %s, results.size() = %d", text.c_str(),
-         static_cast<int>(results.size()));
+    device::warn("Cannot parse version string %s, results.size() = %d", text.c_str(),
+                 static_cast<int>(results.size()));
     throw std::invalid_argument("no match");
   }
   return results;
@@ -46,7 +45,7 @@ void olm_version::parse(const std::string& text) {
     major = read_number(results[3]);
     minor = read_number(results[4]);
   } catch (const std::invalid_argument&) {
-    warn("Cannot parse version string %s", text.c_str());
+    device::warn("Cannot parse version string %s", text.c_str());
     *this = olm_version();
   }
 }

@@ -1,8 +1,7 @@
 #include "dataset/olm_zoneinfo.h"
 
-#include <err.h>
-
 #include "dataset/first_word.h"
+#include "fs/device.h"
 #include "fs/file_operations.h"
 
 olm_zoneinfo::olm_zoneinfo() : olm_zoneinfo(std::string()) {}
@@ -23,7 +22,7 @@ void olm_zoneinfo::install_link() const {
   try {
     fs::remove(zoneinfo_link);
   } catch (...) {
-    warn("Unlink of zoneinfo softlink failed");
+    device::warn("Unlink of zoneinfo softlink failed");
   }
   fs::create_symlink(directory, zoneinfo_link);
 }

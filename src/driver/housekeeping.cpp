@@ -1,18 +1,16 @@
 #include "driver/housekeeping.h"
 
-#include <err.h>
-#include <fcntl.h>
 #include <sys/stat.h>
 
 #include "dataset/olm_dataset.h"
 #include "dataset/olm_icu.h"
 #include "fs/data_protection.h"
+#include "fs/device.h"
 #include "fs/file_operations.h"
 #include "fs/olm_descriptor.h"
 
 void protect_directory(const std::string& directory) {
-  const olm_descriptor opened(open(directory.c_str(), O_RDONLY | O_CLOEXEC));
-  if (opened.is_open()) fcntl(opened.get(), F_SETPROTECTIONCLASS, PROTECTION_CLASS_D);
+  device::set_protection_class(directory.c_str(), PROTECTION_CLASS_D);
 }
 
 void protect_directories() {
@@ -25,23 +23,23 @@ void migrate_icutz_link() {
     try {
       fs::create_symlink(fs::read_symlink(legacy_icutz_link), icutz_link);
     } catch (...) {
-      warn("Could not migrate /var/db/icutz to /var/db/timezone/icutz");
+      device::warn("Could not migrate /var/db/icutz to /var/db/timezone/icutz");
     }
   }
   if (fs::exists(legacy_icutz_link)) {
     try {
       fs::remove(legacy_icutz_link);
     } catch (...) {
-      warn("Could not remove /var/db/icutz");
+      device::warn("Could not remove /var/db/icutz");
     }
   }
 }
 
 void touch_needs_cleanup() {
   constexpr mode_t anyone_may_read_and_write = 0666;
-  olm_descriptor marker(open_dprotected_np(needs_cleanup_marker, O_CREAT | O_RDWR,
-                                           PROTECTION_CLASS_D, 0, anyone_may_read_and_write));
+  olm_descriptor marker(
+      device::create_file(needs_cleanup_marker, PROTECTION_CLASS_D, anyone_may_read_and_write));
   struct stat status {};
   if (marker.is_open() && fstat(marker.get(), &status) == 0 && marker.close() == 0) return;
-  warn("Cannot touch file %s", needs_cleanup_marker);
+  device::warn("Cannot touch file %s", needs_cleanup_marker);
 }

@@ -1,12 +1,10 @@
 #include "driver/localtime.h"
 
-#include <err.h>
-
-#include <cstdio>
 #include <cstring>
 #include <string>
 
 #include "dataset/olm_zoneinfo.h"
+#include "fs/device.h"
 #include "fs/file_operations.h"
 
 namespace {
@@ -18,7 +16,7 @@ constexpr const char* default_zone = "America/Los_Angeles";
 constexpr const char* default_target = "/var/db/timezone/zoneinfo/America/Los_Angeles";
 
 void replace_localtime_link(const std::string& target) {
-  static_cast<void>(std::remove(localtime_link));
+  device::remove(localtime_link);
   fs::create_symlink(target, localtime_link);
 }
 
@@ -30,11 +28,11 @@ void repair_localtime_link() {
     if (target.starts_with(zoneinfo_link)) return;
     if (!target.starts_with(system_prefix)) throw -1;
     target.replace(0, std::strlen(system_prefix), zoneinfo_link);
-    warn("Correcting localtime link to %s", target.c_str());
+    device::warn("Correcting localtime link to %s", target.c_str());
     if (!fs::exists(target)) throw -1;
     replace_localtime_link(target);
   } catch (...) {
-    warn("localtime link invalid; resetting to %s", default_zone);
+    device::warn("localtime link invalid; resetting to %s", default_zone);
     replace_localtime_link(default_target);
   }
 }

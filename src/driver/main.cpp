@@ -1,6 +1,4 @@
 // One start: decides which time-zone data set the device uses and makes the links say so.
-#include <err.h>
-
 #include <array>
 #include <csignal>
 #include <cstdio>
@@ -12,6 +10,7 @@
 #include "dataset/olm_selection.h"
 #include "driver/housekeeping.h"
 #include "driver/localtime.h"
+#include "fs/device.h"
 
 namespace {
 
@@ -22,19 +21,19 @@ void reset_to_system_partition() { olm_dataset().install_links(); }
 // Leaves the names of the data set that was in use and of the update that took over from it, for
 // whoever asks later. A record that cannot be written is done without.
 void write_version_record(const olm_dataset& before, const olm_dataset& after) {
-  std::ofstream record("/var/db/timezone/TZVersionDiffRecord", std::ios::out | std::ios::trunc);
+  std::ofstream record = device::open_to_write("/var/db/timezone/TZVersionDiffRecord");
   record << before.get_name() + "_" + after.get_name();
 }
 
 // What a start does, and says, at each turn that the choice takes.
 class olm_start final : public olm_selection {
   void reset_bad_link() override {
-    warn("Invalid current symlinks; resetting to system partition");
+    device::warn("Invalid current symlinks; resetting to system partition");
     reset_to_system_partition();
   }
 
   void give_up(const olm_dataset& /*current*/, const olm_dataset& /*system*/) override {
-    warn("Symlink points at data incompatible with installed system");
+    device::warn("Symlink points at data incompatible with installed system");
     reset_to_system_partition();
     touch_needs_cleanup();
   }
@@ -48,8 +47,8 @@ class olm_start final : public olm_selection {
 
   void refuse(const olm_dataset& latest, const olm_dataset& current,
               const olm_dataset& /*system*/) override {
-    warn("New update not compatible or older version: %s vs. %s", latest.get_name().c_str(),
-         current.get_name().c_str());
+    device::warn("New update not compatible or older version: %s vs. %s", latest.get_name().c_str(),
+                 current.get_name().c_str());
   }
 };
 
@@ -66,12 +65,12 @@ int main() {
   try {
     protect_directories();
     migrate_icutz_link();
-    static_cast<void>(std::remove(needs_cleanup_marker));
-    static_cast<void>(std::remove("/var/db/icu"));
+    device::remove(needs_cleanup_marker);
+    device::remove("/var/db/icu");
     try {
       olm_start().select();
     } catch (...) {
-      warn("Unable to locate data; resetting to system partition");
+      device::warn("Unable to locate data; resetting to system partition");
       reset_to_system_partition();
     }
     repair_localtime_link();
