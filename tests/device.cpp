@@ -1,6 +1,6 @@
 #include "device.h"
 
-#include <gtest/gtest.h>
+#include <fcntl.h>
 #include <spawn.h>
 #include <sys/mount.h>
 #include <sys/wait.h>
@@ -32,23 +32,35 @@ constexpr const char* nothing = "(nothing)";
 
 constexpr std::uintmax_t large = 3ULL << 30U;
 
-// Takes down what `action`, which gives how it ended, writes on the standard error stream. Of the
-// text of errno behind each warning, one that begins with `cut` is left out.
-report listen(const std::string& cut, const std::function<std::string()>& action) {
-  const std::string name = "\ntzdata-select: ";
-  testing::internal::CaptureStderr();
-  report heard = {action()};
-  std::string text = "\n";
-  text += testing::internal::GetCapturedStderr();
-  text.pop_back();
-  for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
-    const std::string warning = text.substr(at + name.size());
-    // One that lacks such a text altogether is passed on with all that surrounds it.
-    const bool is_whole = warning.find(": ") != std::string::npos;
-    heard.insert(heard.begin(), is_whole ? warning.substr(0, warning.rfind(": " + cut)) : text);
-  }
-  if (!text.empty()) heard.insert(heard.begin(), text);
-  return heard;
+std::string read_file(const files::path& path) {
+  return (std::ostringstream() << std::ifstream(path).rdbuf()).str();
+}
+
+// Runs a command with an empty environment, and gives how it ended.
+std::string run(report command) {
+  std::vector<char*> words(command.size() + 1);
+  std::transform(command.begin(), command.end(), words.begin(),
+                 [](std::string& word) { return word.data(); });
+  posix_spawn_file_actions_t actions;
+  posix_spawn_file_actions_init(&actions);
+  posix_spawn_file_actions_addopen(&actions, 1, output.c_str(), O_CREAT | O_TRUNC | O_WRONLY, 0644);
+  posix_spawn_file_actions_adddup2(&actions, 1, 2);
+  pid_t pid = 0;
+  // The command's end is also an empty environment.
+  int status = posix_spawnp(&pid, words[0], &actions, nullptr, words.data(), &words.back());
+  posix_spawn_file_actions_destroy(&actions);
+  waitpid(pid, &status, 0);
+  return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
+                           : "signal " + std::to_string(WTERMSIG(status));
+}
+
+// What runs a program under strace, if there are options for it.
+report trace(const report& options) {
+  if (options.empty()) return {};
+  // A leak checker cannot do its work in a traced process.
+  return report{"strace", "--quiet=path-resolution",    "-o", "/dev/null",
+                "-E",     "ASAN_OPTIONS=detect_leaks=0"} +
+         options;
 }
 
 }  // namespace
@@ -103,7 +115,7 @@ device look() {
       } else if (there.is_regular_file() && there.file_size() == large) {
         found[there.path()];
       } else if (!there.is_directory()) {
-        found[there.path()] = (std::ostringstream() << std::ifstream(there.path()).rdbuf()).str();
+        found[there.path()] = read_file(there.path());
       } else if (files::is_empty(there)) {
         found[there.path()] = directory;
       }
@@ -112,40 +124,32 @@ device look() {
   return found;
 }
 
-report start(std::vector<std::string> tracing) {
-  // A leak checker cannot do its work in a traced process.
-  const auto tracer = {"strace", "--quiet=path-resolution",    "-o", "/dev/null",
-                       "-E",     "ASAN_OPTIONS=detect_leaks=0"};
-  if (!tracing.empty()) tracing.insert(tracing.begin(), tracer.begin(), tracer.end());
+report start(const report& tracing) {
   const char* emulator = std::getenv("TZDATA_SELECT_EMULATOR");
   const char* program = std::getenv("TZDATA_SELECT_PROGRAM");
-  if (emulator != nullptr) tracing.emplace_back(emulator);
-  tracing.emplace_back(program != nullptr ? program : PROGRAM);
-  std::vector<char*> command(tracing.size() + 1);
-  std::transform(tracing.begin(), tracing.end(), command.begin(),
-                 [](std::string& word) { return word.data(); });
-  return listen("", [&] {
-    pid_t pid = 0;
-    // The command's end is also an empty environment.
-    int status = posix_spawnp(&pid, command[0], nullptr, nullptr, command.data(), &command.back());
-    waitpid(pid, &status, 0);
-    return WIFEXITED(status) ? "exit " + std::to_string(WEXITSTATUS(status))
-                             : "signal " + std::to_string(WTERMSIG(status));
-  });
+  report command = report{"setpriv", "--bounding-set=-all", "--inh-caps=-all"} + trace(tracing);
+  if (emulator != nullptr) command.emplace_back(emulator);
+  command.emplace_back(program != nullptr ? program : PROGRAM);
+  report heard = {run(command)};
+  const std::string name = "\ntzdata-select: ";
+  std::string text = "\n";
+  text += read_file(output);
+  text.pop_back();
+  for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
+    const std::string warning = text.substr(at + name.size());
+    // One that lacks the text of errno altogether is passed on with all that surrounds it.
+    const bool is_whole = warning.find(": ") != std::string::npos;
+    heard.insert(heard.begin(), is_whole ? warning.substr(0, warning.rfind(": ")) : text);
+  }
+  if (!text.empty()) heard.insert(heard.begin(), text);
+  return heard;
 }
 
-report hear(const std::function<void()>& action) {
-  return listen(strerror(0), [&]() -> std::string {
-    try {
-      errno = 0;
-      action();
-    } catch (int value) {
-      return "int " + std::to_string(value);
-    } catch (const std::invalid_argument& failure) {
-      return std::string("invalid_argument ") + failure.what();
-    } catch (const std::out_of_range&) {
-      return "out_of_range";
-    }
-    return "done";
-  });
+report ask(const report& arguments, const report& tracing) {
+  const std::string end = run(trace(tracing) + report{STATUS} + arguments);
+  report answer;
+  std::ifstream lines(output);
+  for (std::string line; std::getline(lines, line);) answer.push_back(line);
+  answer.push_back(end);
+  return answer;
 }

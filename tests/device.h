@@ -1,7 +1,6 @@
 // The device that a private root shows: laying one out, looking at it, starting the program on it.
 #pragma once
 
-#include <functional>
 #include <map>
 #include <string>
 #include <utility>
@@ -52,16 +51,17 @@ void lay_out(const entries& contents);
 // The device as it is.
 device look();
 
-// What came of an action: its warnings, without the program's name, then how it ended. A line that
-// lacks the name belongs to the warning before it.
+// What a program said, and then how it ended, such as "exit 0" or "signal 11".
 using report = std::vector<std::string>;
 
-// Starts the built program, under strace if there are `tracing` options for it. The environment may
-// name another program (TZDATA_SELECT_PROGRAM), and the emulator that this needs
-// (TZDATA_SELECT_EMULATOR). The warnings lack the text of errno; it ends with its status, such as
-// "exit 0", or with "signal 11".
-report start(std::vector<std::string> tracing = {});
+// Starts the built program with the rights that the unit has, under strace if there are `tracing`
+// options for it. The environment may name another program (TZDATA_SELECT_PROGRAM), and the
+// emulator that this needs (TZDATA_SELECT_EMULATOR). Gives its warnings, without the program's name
+// and the text of errno; a line that lacks the name belongs to the warning before it.
+report start(const report& tracing = {});
 
-// Runs `action` in this process, with no error before it: a warning ends with the text of errno
-// only if a call failed. It ends with what it threw, such as "int 17", or with "done".
-report hear(const std::function<void()>& action);
+// Asks the built tzdata-status, under strace if there are `tracing` options. Gives its lines.
+report ask(const report& arguments, const report& tracing = {});
+
+// What those two write while they run.
+inline const std::string output = "/var/output";

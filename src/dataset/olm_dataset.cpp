@@ -58,6 +58,14 @@ void olm_dataset::install_links() const {
 
 std::string olm_dataset::get_name() const { return name; }
 
+bool may_stay(const olm_dataset& current, const olm_dataset& system) {
+  return current.compatible_with(system) && !(system > current);
+}
+
+bool takes_over(const olm_dataset& latest, const olm_dataset& current, const olm_dataset& system) {
+  return latest.compatible_with(system) && latest > current;
+}
+
 std::string latest_dataset_path() { return fs::read_symlink(latest_link); }
 
 std::string dataset_path_from_link(const std::string& target) {

@@ -56,6 +56,15 @@ class olm_dataset {
   void create_components();
 };
 
+// Whether the current data set may stay in use: it is fit, and no older than the system
+// partition's. Prints what compatible_with prints.
+[[nodiscard]] bool may_stay(const olm_dataset& current, const olm_dataset& system);
+
+// Whether the latest update is to be used: it is fit, and newer than the current data set, even if
+// that may not stay. Prints what compatible_with prints.
+[[nodiscard]] bool takes_over(const olm_dataset& latest, const olm_dataset& current,
+                              const olm_dataset& system);
+
 // The target of latest_link; empty when there is no such link. Nothing checks it here. Prints and
 // throws what fs::read_symlink does.
 [[nodiscard]] std::string latest_dataset_path();

@@ -17,8 +17,8 @@ namespace {
 // nothing. Prints and throws errno when the walk cannot be started.
 std::string find_schema(const std::string& directory) {
   std::string schema;
-  const bool is_walked = device::walk(directory, [&](const char* name, const struct stat& status) {
-    if ((status.st_mode & S_IROTH) != 0) schema = read_schema(name);
+  const bool is_walked = device::walk(directory, [&](const char* name, mode_t mode) {
+    if ((mode & S_IROTH) != 0) schema = read_schema(name);
     return !schema.empty();
   });
   if (is_walked) return schema;

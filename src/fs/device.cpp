@@ -2,6 +2,7 @@
 
 #include <err.h>
 #include <fts.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <array>
@@ -58,7 +59,7 @@ bool walk(std::string directory, const file_visitor& visit) {
       fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr));
   if (!entries) return false;
   while (const FTSENT* entry = fts_read(entries.get())) {
-    if (is_file_in_root(*entry) && visit(&entry->fts_name[0], *entry->fts_statp)) break;
+    if (is_file_in_root(*entry) && visit(&entry->fts_name[0], entry->fts_statp->st_mode)) break;
   }
   return true;
 }

@@ -6,7 +6,6 @@
 // calls, forecast/olm_trial.cpp looks at the device but only remembers what is to be changed.
 #pragma once
 
-#include <sys/stat.h>
 #include <sys/types.h>
 
 #include <fstream>
@@ -36,8 +35,8 @@ void set_protection_class(const char* directory, int protection_class);
 [[nodiscard]] std::ifstream open_to_read(const std::string& path);
 [[nodiscard]] std::ofstream open_to_write(const std::string& path);
 
-// Takes the name and the status of a file; true to see no more of them.
-using file_visitor = std::function<bool(const char* name, const struct stat& status)>;
+// Takes the name and the mode of a file; true to see no more of them.
+using file_visitor = std::function<bool(const char* name, mode_t mode)>;
 
 // Calls `visit` for each regular file directly in `directory`, which may be a link, in the
 // directory's own order. Gives false, with errno set, when the walk cannot be started; a directory

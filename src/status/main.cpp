@@ -1,327 +1,241 @@
-// Tells which data sets a device has and what its next start will do about them. Changes nothing.
+// Tells which data sets a device has and what its next start will do. Changes nothing.
+#include <err.h>
+#include <getopt.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <cctype>
-#include <cerrno>
 #include <cstdio>
-#include <filesystem>
+#include <cstdlib>
+#include <exception>
 #include <span>
-#include <stdexcept>
 #include <string>
-#include <system_error>
 #include <utility>
-#include <vector>
 
-#include "dataset/olm_icu.h"
-#include "dataset/olm_selection.h"
-#include "dataset/olm_zoneinfo.h"
-#include "driver/localtime.h"
-#include "fs/file_operations.h"
+#include "status/explain.h"
+#include "status/facts.h"
 
 namespace {
 
-namespace files = std::filesystem;
 using std::string;
 
 constexpr int cannot_be_told = 2;
+constexpr std::size_t label_width = 12;
+constexpr std::size_t line_width = 80;
 
-// There only if the directory is.
-constexpr const char* directory_of_links = "/var/db/timezone/.";
-
-// What is at `path`, not what a link there leads to.
-files::file_type look_at(const char* path) {
-  std::error_code error;
-  return files::symlink_status(path, error).type();
-}
-
-// Empty also for what is no link.
-string read_target(const char* path) {
-  try {
-    return fs::read_symlink(path);
-  } catch (int) {
-    return {};
-  }
-}
-
-string or_none(string text) {
-  if (text.empty()) text = "none";
-  return text;
-}
-
-const olm_icu& get_icu(const olm_dataset& data) {
-  return dynamic_cast<const olm_icu&>(*data.components.back());
-}
-
-// What an update that does not fit has for ICU data.
-string describe_icu(const olm_dataset& update, const olm_dataset& system) {
-  const olm_icu& icu = get_icu(update);
-  if (!icu.schema.empty())
-    return "schema " + icu.schema + ", the system partition " + or_none(get_icu(system).schema);
-  std::error_code error;
-  for (const auto& there : files::directory_iterator(icu.directory, error)) {
-    const bool is_closed =
-        (there.status(error).permissions() & files::perms::others_read) == files::perms::none;
-    const string name = there.path().filename();
-    const bool has_name = name.starts_with("icutz") && name.ends_with(".dat");
-    if (is_closed && has_name) return name + ", which others may not read";
-  }
-  return "no ICU data";
-}
-
-// The path of the current data set; empty also where the zoneinfo link cannot be understood.
-string find_current() {
-  try {
-    return current_dataset_path();
-  } catch (int) {
-    return {};
-  }
-}
-
-string locate(const string& path) {
-  if (path.empty()) return system_zoneinfo_directory;
-  return path;
-}
-
-bool has_large_number(const string& path) {
-  try {
-    const olm_dataset data(path);
-    return false;
-  } catch (const std::out_of_range&) {
-    return true;
-  }
-}
-
-// Which of the data sets that are weighed with `update` has a number beyond 32 bits.
-string find_large_number(const string& update) {
-  if (has_large_number("")) return locate("");
-  const string current = find_current();
-  return has_large_number(current) ? current : update;
-}
-
-// What was thrown while `update` was weighed.
-string describe_failure(const string& update) {
-  try {
-    throw;
-  } catch (const std::invalid_argument&) {
-    return string("the update is not below ") + update_area;
-  } catch (const std::out_of_range&) {
-    return "a number beyond 32 bits is in the version of " + find_large_number(update);
-  } catch (const std::runtime_error& obstacle) {
-    return obstacle.what();
-  } catch (int) {
-    return string(latest_link) + ", or what it names, cannot be read";
-  }
-}
-
-// The next start, gone through without doing anything. It takes for granted that a link can be made
-// and removed where no directory is in the way.
-class olm_forecast final : public olm_selection {
- public:
-  // `path`, if not empty, stands for what tz_latest names, and the reasons are for what becomes of
-  // that. Throws only for want of memory.
-  explicit olm_forecast(string path) : judges(!path.empty()), update(std::move(path)) {
-    const string before = zoneinfo + '\n' + icutz;
-    migrate_icutz();
-    try {
-      try {
-        select();
-        if (update.empty()) reasons.emplace_back("there is no latest update");
-        if (decision.empty()) decision = "keeps " + olm_dataset(current_dataset_path()).name;
-      } catch (...) {
-        reasons.push_back(describe_failure(update));
-        reset();
-      }
-    } catch (...) {
-      decision = "fails, and leaves the zoneinfo link as it is";
-      const string last = describe_failure(update);
-      if (reasons.back() != last) reasons.push_back(last);
-    }
-    changes_links = zoneinfo + '\n' + icutz != before;
-  }
-
-  bool judges;
-  string update;
-  string decision;  // what the start does, such as "keeps 2020a.1.0"
-  std::vector<string> reasons;
-  string zoneinfo = read_target(zoneinfo_link);  // where the links will lead
-  // A file is no link, but goes like one.
-  string icutz =
-      look_at(icutz_link) == files::file_type::regular ? "a file" : read_target(icutz_link);
-  bool changes_links = false;
-  bool installs_update = false;
-
- private:
-  [[nodiscard]] string find_latest() override {
-    if (update.empty()) update = olm_selection::find_latest();
-    return update;
-  }
-
-  void reset_bad_link() override {
-    reasons.push_back("the zoneinfo link leads to no data set: " + or_none(zoneinfo));
-    reset();
-  }
-
-  void give_up(const olm_dataset& current, const olm_dataset& system) override {
-    const string what = "the current data set " + current.name;
-    const string older = what + " is older than the system partition " + system.name;
-    explain_schema(what, current, system);
-    if (system > current) reasons.push_back(older);
-    reset();
-  }
-
-  void install(const olm_dataset& latest, const olm_dataset& /*in_use*/,
-               const olm_dataset& /*system*/) override {
-    if (judges) reasons.clear();
-    reasons.push_back("the update " + latest.name + " is fit, and newer than the current data set");
-    point_links(latest);
-    installs_update = true;
-  }
-
-  void refuse(const olm_dataset& latest, const olm_dataset& current,
-              const olm_dataset& system) override {
-    const string what = "the update " + latest.name;
-    if (judges) reasons.clear();
-    if (latest.version == olm_version()) reasons.push_back(what + " has a name that is no version");
-    explain_schema(what, latest, system);
-    if (latest > current) return;
-    const char* const than = current > latest            ? " is older than "
-                             : latest.same_path(current) ? " is "
-                                                         : " is not newer than ";
-    reasons.push_back(what + than + "the current data set " + current.name);
-  }
-
-  void explain_schema(const string& what, const olm_dataset& data, const olm_dataset& system) {
-    if (!data.compatible_with(system))
-      reasons.push_back(what + " has " + describe_icu(data, system));
-  }
-
-  // As migrate_icutz_link does it.
-  void migrate_icutz() {
-    const string target = read_target(legacy_icutz_link);
-    if (!fs::exists(legacy_icutz_link)) return;
-    if (!fs::exists(directory_of_links)) return;
-    if (target.empty() || look_at(icutz_link) != files::file_type::not_found) return;
-    icutz = target;
-    reasons.emplace_back("the ICU link of earlier systems moves to its new place");
-  }
-
-  void reset() { point_links(olm_dataset()); }
-
-  // As install_links does it.
-  void point_links(const olm_dataset& data) {
-    const bool is_update = !data.path.empty();
-    decision = (is_update ? "installs " : "falls back to the system partition, ") + data.name;
-    if (!fs::exists(directory_of_links)) throw std::runtime_error("no directory for the links");
-    if (look_at(zoneinfo_link) == files::file_type::directory)
-      throw std::runtime_error("a directory is in the place of the zoneinfo link");
-    zoneinfo = olm_zoneinfo(data.path).directory;
-    if (look_at(icutz_link) != files::file_type::directory) {
-      icutz.clear();
-      if (is_update) icutz = get_icu(data).directory;
-    } else if (is_update) {
-      throw std::runtime_error("a directory is in the place of the ICU link");
-    }
-  }
-};
+constexpr const char* usage = "usage: tzdata-status [--query] [--root=DIRECTORY] [UPDATE]\n";
+constexpr const char* help =
+    "Tells which time-zone data a device uses, and what the next start of tzdata-select will do.\n"
+    "With UPDATE, the path of an update, tells whether the next start would use it.\n\n"
+    "  --query           print a line \"Key: value\" for each thing, for scripts\n"
+    "  --root=DIRECTORY  tell of the image in DIRECTORY (needs root)\n"
+    "  --help            print this help\n"
+    "  --version         print the version\n\n"
+    "Exit status: 0 if the next start changes no link, 1 if it changes one or fails; with UPDATE,\n"
+    "0 if it is used, 1 if it is refused. 2 if that cannot be told.\n";
 
 // Names come from outside: a control byte shows as a question mark, so that a line stays one.
-void print_row(const char* label, string text) {
-  for (char& byte : text) {
-    if (std::iscntrl(static_cast<unsigned char>(byte)) != 0) byte = '?';
-  }
-  std::printf("%-17s %s\n", label, text.c_str());
-}
-
-void print_reasons(const char* label, const olm_forecast& forecast) {
-  for (const auto& reason : forecast.reasons) print_row(std::exchange(label, ""), reason);
-}
-
-string pad(string text, std::size_t width) {
-  text.resize(std::max(text.size(), width), ' ');
+string clean(string text) {
+  std::replace_if(
+      text.begin(), text.end(),
+      [](char byte) { return std::iscntrl(static_cast<unsigned char>(byte)) != 0; }, '?');
   return text;
 }
 
-string describe(const string& path) {
-  try {
-    const olm_dataset data(path);
-    return pad(data.name, 12) + " schema " + pad(or_none(get_icu(data).schema), 5) + " " +
-           locate(path);
-  } catch (...) {
-    return "cannot be used: " + locate(path);
+struct answer {
+  device_facts facts;
+  sentences because;
+  sentences remarks;
+  sentences reasons;  // for what becomes of the latest update
+};
+
+answer find_answer(const string& update) {
+  const device_facts facts = gather_facts(update);
+  return {facts, explain_start(facts), list_remarks(facts), explain_latest(facts)};
+}
+
+// What becomes of the update that was asked about.
+const char* get_verdict(const device_facts& facts) {
+  if (facts.start.installs) return "used";
+  return stays_in_use(facts) ? "in-use" : "refused";
+}
+
+int get_status(const device_facts& facts, bool is_asked_of_update) {
+  const start_forecast& start = facts.start;
+  const bool is_used = start.installs || stays_in_use(facts);
+  const bool all_stays =
+      start.status == EXIT_SUCCESS && start.zoneinfo.now.equals(start.zoneinfo.next) &&
+      start.icutz.now.equals(start.icutz.next) && start.localtime.now.equals(start.localtime.next);
+  return (is_asked_of_update ? is_used : all_stays) ? EXIT_SUCCESS : EXIT_FAILURE;
+}
+
+// --- For scripts ---
+
+void print_key(const char* key, const string& value) {
+  std::printf("%s: %s\n", key, clean(value).c_str());
+}
+
+void print_keys(const char* key, const sentences& values) {
+  for (const string& value : values) print_key(key, value);
+}
+
+void print_keys_of_dataset(const string& which, const dataset_facts& facts) {
+  print_key((which + "-Version").c_str(), facts.data ? facts.data->name : "");
+  print_key((which + "-Schema").c_str(), facts.data ? get_icu(*facts.data).schema : "");
+}
+
+void print_query(const answer& answer, bool is_asked_of_update) {
+  const device_facts& facts = answer.facts;
+  const start_forecast& start = facts.start;
+  print_key("Zoneinfo", start.zoneinfo.now.target);
+  print_key("Icutz", start.icutz.now.target);
+  print_key("Localtime", start.localtime.now.target);
+  print_keys_of_dataset("System", facts.system);
+  print_keys_of_dataset("Current", facts.current);
+  print_keys_of_dataset("Latest", facts.latest);
+  print_key("Next-Zoneinfo", start.zoneinfo.next.target);
+  print_key("Next-Icutz", start.icutz.next.target);
+  print_key("Next-Localtime", start.localtime.next.target);
+  print_key("Next-Status", start.status ? std::to_string(*start.status) : "none");
+  print_keys("Next-Warning", start.warnings);
+  print_keys("Because", answer.because);
+  print_keys("Remark", answer.remarks);
+  for (const update_facts& update : facts.updates)
+    print_key("Update", update.name + ' ' + update.state);
+  if (!is_asked_of_update) return;
+  print_key("Verdict", get_verdict(facts));
+  print_keys("Reason", answer.reasons);
+}
+
+// --- For people ---
+
+// Prints `text` beside a label, in lines that are broken at spaces.
+void print_text(const char* label, const string& text) {
+  constexpr std::size_t width = line_width - label_width;
+  string rest = clean(text);
+  do {
+    std::size_t end = rest.size() <= width ? string::npos : rest.rfind(' ', width);
+    if (rest.size() > width && end == string::npos) end = rest.find(' ');
+    std::printf("%-*s%s\n", static_cast<int>(label_width), std::exchange(label, ""),
+                rest.substr(0, end).c_str());
+    rest.erase(0, end == string::npos ? end : end + 1);
+  } while (!rest.empty());
+}
+
+void print_texts(const char* label, const sentences& texts) {
+  for (const string& text : texts) print_text(std::exchange(label, ""), text);
+}
+
+void print_dataset(const char* label, const dataset_facts& facts) {
+  string text = facts.problem.empty() ? "none" : "cannot be used: " + facts.problem;
+  if (facts.data) {
+    const string& schema = get_icu(*facts.data).schema;
+    text = facts.data->name + ", schema " + (schema.empty() ? "none" : schema);
+  }
+  print_text(label, text);
+}
+
+void print_report(const answer& answer) {
+  const device_facts& facts = answer.facts;
+  const start_forecast& start = facts.start;
+  print_dataset("system", facts.system);
+  print_dataset("current", facts.current);
+  print_dataset("latest", facts.latest);
+  print_text("zoneinfo", describe(start.zoneinfo.now));
+  print_text("icutz", describe(start.icutz.now));
+  print_text("localtime", describe(start.localtime.now));
+  // One line, however long: scripts take its end.
+  const string& target = start.zoneinfo.next.target;
+  std::printf("%-*s%s: %s\n", static_cast<int>(label_width), "next start",
+              clean(describe_start(facts)).c_str(),
+              target.empty() ? "none" : clean(target).c_str());
+  print_texts("because", answer.because);
+  print_texts("will warn", start.warnings);
+  print_texts("remarks", answer.remarks);
+  const char* label = "updates";
+  for (const update_facts& update : facts.updates) {
+    string text = update.name + ' ' + update.state;
+    if (update.state == "refused" && !answer.reasons.empty()) text += ": " + answer.reasons.front();
+    print_text(std::exchange(label, ""), text);
   }
 }
 
-string describe_current() {
-  try {
-    return describe(current_dataset_path());
-  } catch (int) {
-    return "none";
+// --- What was asked ---
+
+struct question {
+  bool is_query = false;
+  const char* root = nullptr;
+  string update;
+  bool had_slash = false;  // at the end of the update's path
+};
+
+[[noreturn]] void end(const string& text) {
+  std::fputs(text.c_str(), stdout);
+  std::exit(std::fflush(stdout) == 0 ? EXIT_SUCCESS : cannot_be_told);
+}
+
+[[noreturn]] void refuse_usage() {
+  std::fputs(usage, stderr);
+  std::exit(cannot_be_told);
+}
+
+question read_question(int count, char* arguments[]) {
+  const std::array<option, 5> options = {{{"query", no_argument, nullptr, 'q'},
+                                          {"root", required_argument, nullptr, 'r'},
+                                          {"help", no_argument, nullptr, 'h'},
+                                          {"version", no_argument, nullptr, 'v'},
+                                          {nullptr, 0, nullptr, 0}}};
+  question asked;
+  for (int next = 0; (next = getopt_long(count, arguments, "", options.data(), nullptr)) != -1;) {
+    switch (next) {
+      case 'q':
+        asked.is_query = true;
+        break;
+      case 'r':
+        asked.root = optarg;
+        break;
+      case 'h':
+        end(string(usage) + '\n' + help);
+      case 'v':
+        end("tzdata-status " VERSION "\n");
+      default:
+        refuse_usage();
+    }
   }
-}
-
-string describe_latest() {
-  const string path = read_target(latest_link);
-  if (path.empty()) return "none";
-  return describe(path);
-}
-
-// Prints that the forecast cannot be told, and throws errno, if this user may not look at `path`.
-void demand(const string& path, int mode) {
-  if (access(path.c_str(), mode) == 0 || errno != EACCES) return;
-  print_row("cannot be told", "you may not read " + path);
-  throw errno;
-}
-
-// Gives the exit status, as does judge.
-int tell() {
-  const olm_forecast forecast("");
-  string zone = read_target(localtime_link);
-  const string prefix = string(zoneinfo_link) + "/";
-  if (zone.starts_with(prefix)) zone.erase(0, prefix.size());
-  print_row("system partition", describe(""));
-  print_row("current", describe_current());
-  print_row("latest update", describe_latest());
-  print_row("local zone", or_none(zone));
-  print_row("next start", forecast.decision + ": " + or_none(forecast.zoneinfo));
-  print_reasons("because", forecast);
-  if (!forecast.changes_links) return 0;
-  print_row("provided that", "links can be made and removed: nothing here tries to write");
-  return 1;
-}
-
-// Whether the next start would install the update at `path`.
-int judge(const string& path) {
-  const olm_forecast forecast(path);
-  print_row(forecast.installs_update ? "would be used" : "would be refused", path);
-  print_reasons("", forecast);
-  const bool has_version = fs::exists(olm_zoneinfo(path).directory + version_file);
-  if (!has_version && errno == ENOENT)
-    print_row("", string("it has no zoneinfo") + version_file + ", which a start does not ask for");
-  return forecast.installs_update ? 0 : 1;
+  const std::span operands(arguments + optind, arguments + count);
+  if (operands.size() > 1) refuse_usage();
+  if (operands.empty()) return asked;
+  asked.update = operands.front();
+  asked.had_slash = asked.update.ends_with('/');
+  while (asked.update.ends_with('/')) asked.update.pop_back();
+  if (asked.update.empty()) refuse_usage();
+  return asked;
 }
 
 }  // namespace
 
 int main(int count, char* arguments[]) {
-  const string update = count == 2 ? std::span(arguments, 2)[1] : "";
-  if (count > 2 || update.starts_with('-') || (count == 2 && update.empty())) {
-    static_cast<void>(std::fputs("usage: tzdata-status [UPDATE]\n", stderr));
-    return cannot_be_told;
-  }
-  // What a start would warn of is told in other words: a directory takes nothing.
-  if (std::freopen("/", "r", stderr) == nullptr) return cannot_be_told;
-  int status = cannot_be_told;
+  const question asked = read_question(count, arguments);
+  const bool is_asked_of_update = !asked.update.empty();
+  if (asked.root != nullptr && (chroot(asked.root) != 0 || chdir("/") != 0))
+    err(cannot_be_told, "--root=%s", asked.root);
   try {
-    // Of all that a start reads, what an ordinary user may be barred from.
-    demand(string(system_zoneinfo_directory) + version_file, R_OK);
-    demand(string(system_icu_directory) + schema_file, R_OK);
-    demand(legacy_icutz_link, F_OK);
-    demand(find_current() + "/icutz", R_OK | X_OK);
-    demand((update.empty() ? string(latest_link) : update) + "/icutz", R_OK | X_OK);
-    status = update.empty() ? tell() : judge(update);
-  } catch (...) {
-    // It has been told, or memory ran out.
+    answer answer = find_answer(asked.update);
+    if (asked.had_slash)
+      answer.reasons.emplace_back(
+          "the target of tz_latest must not end in a slash, as this path did");
+    if (asked.is_query) {
+      print_query(answer, is_asked_of_update);
+    } else if (is_asked_of_update) {
+      print_text(get_verdict(answer.facts), asked.update);
+      print_texts("", answer.reasons);
+    } else {
+      print_report(answer);
+    }
+    if (std::fflush(stdout) != 0) err(cannot_be_told, "standard output");
+    return get_status(answer.facts, is_asked_of_update);
+  } catch (const std::exception& failure) {
+    errx(cannot_be_told, "cannot be told: %s", clean(failure.what()).c_str());
   }
-  return std::fflush(stdout) == 0 ? status : cannot_be_told;
 }

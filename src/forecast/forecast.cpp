@@ -1,0 +1,31 @@
+#include "forecast/forecast.h"
+
+#include <algorithm>
+
+#include "dataset/olm_dataset.h"
+#include "dataset/olm_icu.h"
+#include "dataset/olm_zoneinfo.h"
+#include "driver/localtime.h"
+#include "driver/start.h"
+
+start_forecast forecast_start(const std::string& latest) {
+  start_forecast forecast;
+  olm_trial trial;
+  forecast.zoneinfo.now = trial.find(zoneinfo_link);
+  forecast.icutz.now = trial.find(icutz_link);
+  forecast.localtime.now = trial.find(localtime_link);
+  if (!latest.empty()) trial.put_link(latest_link, latest);
+  const int status = run_start();
+  trial.require_told();
+  forecast.endless = trial.endless;
+  if (forecast.endless.empty()) forecast.status = status;
+  forecast.warnings = trial.warnings;
+  forecast.obstacles = trial.obstacles;
+  const auto& written = trial.written;
+  forecast.installs = std::find(written.begin(), written.end(), version_record) != written.end();
+  forecast.zoneinfo.next = trial.find(zoneinfo_link);
+  forecast.icutz.next = trial.find(icutz_link);
+  forecast.localtime.next = trial.find(localtime_link);
+  forecast.zone_exists = trial.find(localtime_link, true).is(S_IFREG);
+  return forecast;
+}

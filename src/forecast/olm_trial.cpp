@@ -1,0 +1,274 @@
+#include "forecast/olm_trial.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <sys/statvfs.h>
+#include <sys/sysmacros.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <climits>
+#include <filesystem>
+#include <fstream>
+#include <iomanip>
+#include <memory>
+#include <stdexcept>
+#include <system_error>
+#include <utility>
+
+namespace {
+
+constexpr int most_links = 40;  // that the kernel follows on the way to one entry
+
+// The unit allows a start 64 MB, and a word takes up to some three times its length.
+constexpr int longest_word = 16 << 20;
+
+const char* get_path(const std::string& place) { return place.empty() ? "/" : place.c_str(); }
+
+std::string get_parent(const std::string& place) {
+  return place.substr(0, place.empty() ? 0 : place.rfind('/'));
+}
+
+bool has_attribute(const olm_entry& entry, unsigned attributes) {
+  return (entry.status.stx_attributes & attributes) != 0;
+}
+
+std::string describe_rights(const olm_entry& entry) {
+  std::array<char, sizeof "7777"> mode{};
+  static_cast<void>(
+      std::snprintf(mode.data(), mode.size(), "%o", entry.status.stx_mode & ALLPERMS));
+  return "user " + std::to_string(entry.status.stx_uid) + ", mode " + mode.data();
+}
+
+struct directory_closer {
+  void operator()(DIR* directory) const { closedir(directory); }
+};
+
+}  // namespace
+
+olm_trial* olm_trial::innermost = nullptr;
+
+bool olm_entry::equals(const olm_entry& other) const {
+  constexpr unsigned kind = S_IFMT;
+  return (status.stx_mode & kind) == (other.status.stx_mode & kind) && target == other.target;
+}
+
+olm_trial::olm_trial() : outer_(std::exchange(innermost, this)) {}
+
+olm_trial::~olm_trial() { innermost = outer_; }
+
+olm_trial& olm_trial::get() {
+  innermost->require_told();
+  if (!innermost->endless.empty()) throw std::runtime_error(innermost->endless);
+  return *innermost;
+}
+
+void olm_trial::require_told() const {
+  if (!untold_.empty()) throw std::runtime_error(untold_);
+}
+
+void olm_trial::leave_untold(const std::string& why) {
+  untold_ = why;
+  throw std::runtime_error(why);
+}
+
+void olm_trial::end(const std::string& place) {
+  endless = place;
+  throw std::runtime_error(place);
+}
+
+void olm_trial::note(const std::string& obstacle) {
+  if (std::find(obstacles.begin(), obstacles.end(), obstacle) == obstacles.end())
+    obstacles.push_back(obstacle);
+}
+
+// What stands at `place`.
+olm_entry olm_trial::look_up(const std::string& place) {
+  const auto change = changes_.find(place);
+  if (change != changes_.end()) return change->second;
+  olm_entry entry{.error = 0, .place = place};
+  if (statx(AT_FDCWD, get_path(place), AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT, STATX_BASIC_STATS,
+            &entry.status) != 0) {
+    if (errno == EACCES) leave_untold("you may not look at " + place);
+    entry.error = errno;
+  }
+  if (entry.is(S_IFLNK)) {
+    std::array<char, PATH_MAX> target{};
+    const ssize_t length = ::readlink(place.c_str(), target.data(), target.size());
+    if (length > 0) entry.target.assign(target.data(), static_cast<std::size_t>(length));
+  }
+  return entry;
+}
+
+// The directory that `entry` stands in.
+olm_entry olm_trial::look_up_directory(const olm_entry& entry) {
+  return look_up(get_parent(entry.place));
+}
+
+bool olm_trial::may(const olm_entry& entry, unsigned rights) {
+  const bool is_roots = entry.status.stx_uid == 0;
+  // Here the mode does not tell all.
+  if (!is_roots && lgetxattr(get_path(entry.place), "system.posix_acl_access", nullptr, 0) > 0)
+    leave_untold(entry.place + " has an access control list");
+  const unsigned shift = is_roots ? 6 : entry.status.stx_gid == 0 ? 3 : 0;
+  if ((entry.status.stx_mode >> shift & rights) == rights) return true;
+  note(get_path(entry.place) + (" is closed to a start: " + describe_rights(entry)));
+  return false;
+}
+
+olm_entry olm_trial::find(const std::string& path, bool follows) {
+  if (path.size() >= PATH_MAX) return {.error = ENAMETOOLONG};
+  std::string rest = path;
+  olm_entry at = look_up("");
+  for (int links = 0;;) {
+    rest.erase(0, rest.find_first_not_of('/'));
+    if (rest.empty()) return at;
+    const std::string name = rest.substr(0, rest.find('/'));
+    rest.erase(0, name.size());
+    if (!may(at, search)) return {.error = EACCES};
+    if (name == ".") continue;
+    olm_entry entry = name == ".." ? look_up_directory(at) : look_up(at.place + '/' + name);
+    const bool is_last = rest.empty();
+    if (entry.is(S_IFLNK) && (follows || !is_last)) {
+      if (++links > most_links) return {.error = ELOOP};
+      rest.insert(0, entry.target);
+      if (rest.starts_with('/')) at = look_up("");
+    } else if (is_last) {
+      return entry;
+    } else if (entry.is(S_IFDIR)) {
+      at = std::move(entry);
+    } else {
+      return {.error = entry.error == 0 ? ENOTDIR : entry.error};
+    }
+  }
+}
+
+std::vector<olm_entry> olm_trial::list(const std::string& directory) {
+  const olm_entry at = find(directory, true);
+  std::vector<olm_entry> entries;
+  if (!at.is(S_IFDIR) || !may(at, read | search)) return entries;
+  const std::unique_ptr<DIR, directory_closer> names(opendir(get_path(at.place)));
+  if (!names && errno == EACCES) leave_untold("you may not read " + at.place);
+  while (const dirent* next = names ? readdir(names.get()) : nullptr) {
+    const std::string name = &next->d_name[0];
+    if (name != "." && name != "..") entries.push_back(look_up(at.place + '/' + name));
+  }
+  return entries;
+}
+
+void olm_trial::put(const std::string& place, mode_t type, const std::string& target) {
+  olm_entry& entry = changes_[place];
+  entry = {.error = type == 0 ? ENOENT : 0, .place = place, .target = target, .is_new = true};
+  entry.status.stx_mode = static_cast<decltype(entry.status.stx_mode)>(type | ACCESSPERMS);
+}
+
+void olm_trial::put_link(const std::string& path, const std::string& target) {
+  const olm_entry entry = find(path);
+  if (!entry.place.empty()) put(entry.place, S_IFLNK, target);
+}
+
+// Why nothing can be written in the directory of `entry`, whatever the unit's rights.
+int olm_trial::refuse_writing(const olm_entry& entry) {
+  if (entry.place.empty()) return entry.error;
+  struct statvfs system {};
+  const std::string directory = get_parent(entry.place);
+  if (statvfs(get_path(directory), &system) != 0 || (system.f_flag & ST_RDONLY) == 0) return 0;
+  note(get_path(directory) + std::string(" can only be read"));
+  return EROFS;
+}
+
+int olm_trial::refuse_making(const olm_entry& entry) {
+  if (entry.error == 0) return EEXIST;
+  if (entry.error != ENOENT) return entry.error;
+  if (const int error = refuse_writing(entry); error != 0) return error;
+  const olm_entry directory = look_up_directory(entry);
+  const bool allowed =
+      may(directory, write_in | search) && !has_attribute(directory, STATX_ATTR_IMMUTABLE);
+  return allowed ? 0 : EACCES;
+}
+
+int olm_trial::refuse_removing(const olm_entry& entry) {
+  if (const int error = refuse_writing(entry); error != 0) return error;
+  if (entry.error != 0) return entry.error;
+  const olm_entry directory = look_up_directory(entry);
+  if (!may(directory, write_in | search)) return EACCES;
+  // In a sticky directory, only the owner of the entry or of the directory may remove it.
+  const bool is_others = (directory.status.stx_mode & S_ISVTX) != 0 &&
+                         directory.status.stx_uid != 0 && entry.status.stx_uid != 0;
+  constexpr unsigned fixed = STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND;
+  if (is_others || has_attribute(directory, fixed) ||
+      has_attribute(entry, fixed | STATX_ATTR_MOUNT_ROOT)) {
+    note(entry.place + " cannot be removed");
+    return EPERM;
+  }
+  return 0;
+}
+
+int olm_trial::unlink(const std::string& path) {
+  const olm_entry entry = find(path);
+  if (const int error = refuse_removing(entry); error != 0) return error;
+  if (entry.is(S_IFDIR)) {
+    note("a directory is in the place of " + path);
+    return EISDIR;
+  }
+  put(entry.place, 0, "");
+  return 0;
+}
+
+int olm_trial::remove(const std::string& path) {
+  const olm_entry entry = find(path);
+  const std::vector<std::string> before = obstacles;
+  int error = refuse_removing(entry);
+  if (error == 0 && entry.is(S_IFDIR)) {
+    std::error_code failure;
+    if (!std::filesystem::is_empty(entry.place, failure)) error = ENOTEMPTY;
+    if (failure) leave_untold("you may not read " + entry.place);
+  }
+  if (error == 0) put(entry.place, 0, "");
+  obstacles = before;  // nobody hears of this failure
+  return error;
+}
+
+int olm_trial::symlink(const std::string& target, const std::string& path) {
+  const olm_entry entry = find(path);
+  const int error = target.size() < PATH_MAX ? refuse_making(entry) : ENAMETOOLONG;
+  if (entry.place.empty()) note("there is no directory for " + path);
+  if (error == 0) put(entry.place, S_IFLNK, target);
+  return error;
+}
+
+int olm_trial::write(const std::string& path, bool reads_too) {
+  const olm_entry entry = find(path, true);
+  if (entry.error != 0) {
+    const int error = refuse_making(entry);
+    if (error == 0) put(entry.place, S_IFREG, "");
+    return error;
+  }
+  if (entry.is(S_IFDIR)) return EISDIR;
+  if (entry.is(S_IFSOCK)) return ENXIO;
+  if (!may(entry, reads_too ? read | write_in : write_in)) return EACCES;
+  if (entry.is(S_IFIFO) && !reads_too) end(entry.place);
+  if (has_attribute(entry, STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND)) return EPERM;
+  return entry.is(S_IFREG) ? refuse_writing(entry) : 0;
+}
+
+// Whether the first word in the file at `place` ends before memory does.
+bool olm_trial::has_end(const std::string& place) {
+  std::ifstream file(place);
+  if (!file.is_open() && errno == EACCES) leave_untold("you may not read " + place);
+  std::string word;
+  file >> std::setw(longest_word) >> word;
+  return word.size() < longest_word;
+}
+
+std::string olm_trial::find_readable(const std::string& path) {
+  const olm_entry entry = find(path, true);
+  if (entry.error != 0 || entry.is(S_IFDIR) || entry.is(S_IFSOCK) || !may(entry, read)) return {};
+  const bool is_null =
+      entry.is(S_IFCHR) && entry.status.stx_rdev_major == 1 && entry.status.stx_rdev_minor == 3;
+  if (is_null) return {};
+  if (!entry.is(S_IFREG) || !has_end(entry.place)) end(entry.place);
+  return entry.place;
+}

@@ -1,0 +1,90 @@
+#pragma once
+
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <map>
+#include <string>
+#include <vector>
+
+// What stands at a path.
+struct olm_entry {
+  int error = ENOENT;    // 0, or the errno with which the system fails to find it
+  std::string place{};   // its path without a link on the way, "" for "/"; empty if there is no way
+  std::string target{};  // what it holds, if it is a link
+  struct statx status {};
+  bool is_new = false;  // it was made in the trial
+
+  [[nodiscard]] bool is(mode_t type) const {
+    return error == 0 && (status.stx_mode & S_IFMT) == type;
+  }
+  // Whether both are of one kind, and hold the same if they are links.
+  [[nodiscard]] bool equals(const olm_entry& other) const;
+};
+
+// A start, or a part of one, that changes nothing. While a trial exists, the functions of
+// fs/device.h look at the device with the unit's rights, whoever runs the program: those of root
+// without capabilities. What they are to change, the trial remembers, and sees from then on. All
+// of it is forgotten with the trial.
+//
+// Two things end a trial early: a file at which a start would wait or run out of memory, and one
+// that the user of the program may not look at although the unit may. Then std::runtime_error is
+// thrown, with that as its text. As a start goes on after whatever is thrown, each further use of
+// fs/device.h throws it again, so that nothing counts that comes later.
+//
+// Nothing here prints. What may look at the device throws as told above, and in no other way.
+class olm_trial {
+ public:
+  olm_trial();
+  olm_trial(const olm_trial&) = delete;
+  olm_trial& operator=(const olm_trial&) = delete;
+  ~olm_trial();
+
+  // What stands at `path` by now; with `follows`, what a link there leads to.
+  [[nodiscard]] olm_entry find(const std::string& path, bool follows = false);
+
+  // The entries of `directory`, which may be a link, in its own order; none if it is missing or
+  // closed to the unit.
+  [[nodiscard]] std::vector<olm_entry> list(const std::string& directory);
+
+  // Puts a link to `target` in place of what stands at `path`.
+  void put_link(const std::string& path, const std::string& target);
+
+  // Throws if the user of this program may not look at what the outcome depends on.
+  void require_told() const;
+
+  std::vector<std::string> warnings;   // without the program's name and the text of errno
+  std::vector<std::string> obstacles;  // what the device or the unit's rights did not allow
+  std::vector<std::string> written;    // the paths of the files that were to be written
+  std::string endless;                 // the file at which a start would wait or run out of memory
+
+  // What fs/device.h asks for; for its second implementation alone. An int is 0 or an errno.
+  [[nodiscard]] static olm_trial& get();
+  [[nodiscard]] int unlink(const std::string& path);
+  [[nodiscard]] int remove(const std::string& path);
+  [[nodiscard]] int symlink(const std::string& target, const std::string& path);
+  [[nodiscard]] int write(const std::string& path, bool reads_too);
+  // The path to open for reading `path`; empty where a start finds nothing to read.
+  [[nodiscard]] std::string find_readable(const std::string& path);
+
+ private:
+  // What the unit may do with an entry, as the bits of a mode.
+  enum right : unsigned { search = 1, write_in = 2, read = 4 };
+
+  [[nodiscard]] olm_entry look_up(const std::string& place);
+  [[nodiscard]] olm_entry look_up_directory(const olm_entry& entry);
+  [[nodiscard]] bool may(const olm_entry& entry, unsigned rights);
+  [[nodiscard]] int refuse_writing(const olm_entry& entry);
+  [[nodiscard]] int refuse_making(const olm_entry& entry);
+  [[nodiscard]] int refuse_removing(const olm_entry& entry);
+  [[nodiscard]] bool has_end(const std::string& place);
+  void note(const std::string& obstacle);
+  void put(const std::string& place, mode_t type, const std::string& target);
+  [[noreturn]] void leave_untold(const std::string& why);
+  [[noreturn]] void end(const std::string& place);
+
+  std::map<std::string, olm_entry> changes_;  // by their places
+  std::string untold_;
+  olm_trial* outer_;
+  static olm_trial* innermost;
+};

@@ -1,0 +1,39 @@
+// What there is on a device, as a start would find it: read with the unit's rights.
+#pragma once
+
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "dataset/olm_dataset.h"
+#include "dataset/olm_icu.h"
+#include "forecast/forecast.h"
+
+// One of the data sets that a start compares.
+struct dataset_facts {
+  std::string path;                    // empty for the system partition
+  std::optional<olm_dataset> data;     // none if there is none, or if it cannot be used
+  std::string problem;                 // why it cannot be used; empty if it can, or is missing
+  std::vector<std::string> obstacles;  // what a start may not read of it
+};
+
+struct update_facts {
+  std::string name;
+  std::string state;  // current, waiting, refused or unused
+};
+
+struct device_facts {
+  start_forecast start;
+  dataset_facts system;
+  dataset_facts current;
+  dataset_facts latest;
+  std::vector<update_facts> updates;  // all on the device, in the order of their names' numbers
+};
+
+// The facts of this device. `latest`, if not empty, stands for what tz_latest holds.
+// Prints nothing. Throws std::runtime_error, with the reason as its text, when the user of this
+// program may not look at something that a start looks at.
+[[nodiscard]] device_facts gather_facts(const std::string& latest);
+
+// The data set's ICU data. Prints nothing.
+[[nodiscard]] const olm_icu& get_icu(const olm_dataset& data);

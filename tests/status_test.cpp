@@ -1,0 +1,269 @@
+// What tzdata-status says beside its forecast: why, and what is not as it should be.
+#include <gtest/gtest.h>
+#include <sys/mount.h>
+#include <sys/stat.h>
+
+#include <array>
+#include <filesystem>
+
+#include "starts.h"
+
+namespace {
+
+using namespace at;
+using std::string;
+
+struct question {
+  entries before;
+  report answer;  // the reasons and remarks; for an update, the verdict and its reasons
+  string ends = "exit 1";
+  string update = "";
+  std::function<void()> prepare = [] {};
+};
+
+// On a device that uses the first update, the update `name` is refused.
+question refuse(
+    const string& name, const entries& changes, const report& reasons,
+    const std::function<void()>& prepare = [] {}) {
+  return {on_first + changes, report{"Verdict: refused"} + reasons, "exit 1", updates + name,
+          prepare};
+}
+
+report because(const string& reason) { return {"Because: " + reason}; }
+report reason(const string& reason) { return {"Reason: " + reason}; }
+report remark(const string& text) { return {"Remark: " + text}; }
+report apart(const string& zoneinfo_target, const string& icutz_target) {
+  return remark("after the next start, the zone files and the ICU data do not belong together: " +
+                zoneinfo_target + " and " + icutz_target);
+}
+report reset(const string& zone_target) {
+  return remark("the local-time link is " + zone_target + "; the next start makes it lead to " +
+                zoneinfo + "/America/Los_Angeles");
+}
+report no_zone(const string& name) {
+  return remark("after the next start, the local-time link leads to no zone file: " + zoneinfo +
+                name);
+}
+report no_icu(const string& name) {
+  return reason("the update " + name +
+                " has no ICU data file that counts; the system partition has schema 44l");
+}
+report waits(const string& path) {
+  return because(path + " makes a start wait, or run out of memory");
+}
+
+const string newer = "the update 2020a.10.0 is fit, and newer than the current data set ";
+const report waiting = because(newer + "2020a.9.0");
+const report in_use = because("the update 2020a.10.0 is the current data set");
+const report mended =
+    remark("the zone files and the ICU data do not belong together now; the next start mends that");
+const string large = "cannot be used: its version has a number beyond 32 bits";
+const string third = updates + "2020b.1.0";
+
+const std::vector<question> questions = {
+    {on_first, {"Verdict: used", "Reason: " + newer + "2020a.9.0"}, "exit 0", second},
+    {on_first + gone(second + "/zoneinfo"),
+     {"Verdict: used", "Reason: " + newer + "2020a.9.0",
+      "Reason: it has no " + second + "/zoneinfo/+VERSION, which a start does not ask for"},
+     "exit 0",
+     second},
+    {on_first,
+     {"Verdict: in-use", "Reason: the update 2020a.9.0 is the current data set",
+      "Reason: the target of tz_latest must not end in a slash, as this path did"},
+     "exit 0",
+     first + "/"},
+
+    // Halves that do not belong together
+    {on_second + gone(icutz), in_use + apart(second + "/zoneinfo", "none"), "exit 0"},
+    {on_second + file(icutz, ""), in_use + apart(second + "/zoneinfo", "a file"), "exit 0"},
+    {on_system + gone(latest) + link_to(icutz, first + "/icutz"),
+     because("there is no latest update") + apart(system_zoneinfo, first + "/icutz"), "exit 0"},
+    {on_first + gone(icutz), waiting + mended},
+
+    // Zones
+    {on_second + link_to(zone, "/usr/share/zoneinfo/Europe/Berlin"),
+     in_use + reset("/usr/share/zoneinfo/Europe/Berlin") + no_zone("/America/Los_Angeles")},
+    {on_second + gone(zone), in_use + reset("missing") + no_zone("/America/Los_Angeles")},
+    {on_second + link_to(zone, zoneinfo + "/Asia/Tokio"), in_use + no_zone("/Asia/Tokio"),
+     "exit 0"},
+    {on_second + link_to(zone, zoneinfo + ".old/Asia/Tokyo"),
+     in_use +
+         remark("the local-time link does not go through the zoneinfo link: " + zoneinfo +
+                ".old/Asia/Tokyo") +
+         no_zone(".old/Asia/Tokyo"),
+     "exit 0"},
+
+    // System partitions
+    {on_system + gone(version) + gone(schema),
+     because("the update 2020a.10.0 has schema 44l; the system partition has schema none") +
+         remark("the system partition has no version: .1.0 is older than any update") +
+         remark("the system partition has no schema: only an update without ICU data fits"),
+     "exit 0"},
+    {on_system + file(schema, "44L"),
+     because("the update 2020a.10.0 has schema 44l; the system partition has schema 44L") +
+         remark("the system partition's schema is none, so no update fits: 44L"),
+     "exit 0"},
+    {on_system + file(version, "9999999999a"), because("the system partition " + large)},
+    {on_second + file(version, "2020b"),
+     because("the current data set 2020a.10.0 is older than the system partition 2020b.1.0")},
+
+    // Links
+    {on_first + link_to(latest, "tz/2020a.10.0"),
+     because("the latest update cannot be used: tz/2020a.10.0 is not below " + updates)},
+    {on_system + file(latest, ""),
+     because("the latest update cannot be used: its link leads to no data set"), "exit 0"},
+    {on_first + link_to(latest, second + "/"),
+     because(latest + " ends in a slash, which makes its name no version") +
+         because("the update 2020a.10.0/ is older than the current data set 2020a.9.0"),
+     "exit 0"},
+    {on_first + link_to(zoneinfo, "tz/2020a.9.0/zoneinfo"),
+     because("the zoneinfo link leads to no data set: tz/2020a.9.0/zoneinfo") +
+         because(newer + "2019c.1.0") + mended},
+    {on_first + link_to(zoneinfo, updates + "2147483648a/zoneinfo"),
+     because("the current data set " + large) + mended},
+    {on_first + folder(zoneinfo),
+     because("the zoneinfo link leads to no data set: a directory") + because(newer + "2019c.1.0") +
+         remark("a directory is in the place of " + zoneinfo) + no_zone("/Asia/Tokyo")},
+    {on_system + gone("/var/db/timezone"),
+     because("the zoneinfo link leads to no data set: none") +
+         because("there is no latest update") + remark("there is no directory for " + zoneinfo) +
+         remark("after the next start, there is no local-time link")},
+    {on_second + gone(icutz), in_use + apart(second + "/zoneinfo", "a file"), "exit 0", "",
+     [] { mkfifo(icutz.c_str(), 0644); }},
+    {on_first + folder("/var/db/icu") + folder(marker),
+     waiting + remark(icutz + " cannot be removed") + apart(system_zoneinfo, "a file"), "exit 1",
+     "",
+     [] {
+       std::filesystem::remove(icutz);
+       mkfifo(icutz.c_str(), 0644);
+       mount(icutz.c_str(), icutz.c_str(), "", MS_BIND, nullptr);
+     }},
+
+    // What makes a start wait
+    {on_first + gone(second + "/zoneinfo"), waits(second + "/zoneinfo/+VERSION"), "exit 1", "",
+     [] {
+       std::filesystem::create_directory(second + "/zoneinfo");
+       mkfifo((second + "/zoneinfo/+VERSION").c_str(), 0644);
+     }},
+    {on_first, waits(record), "exit 1", "", [] { mkfifo(record.c_str(), 0644); }},
+    {on_first + link_to(version, "/dev/zero"), waits("/dev/zero")},
+    {on_first + link_to(first + "/zoneinfo/+VERSION", "/dev/null"), waiting},
+
+    // Why an update is refused
+    refuse("2020a.9.0.0", update(first + ".0"),
+           reason("the update 2020a.9.0.0 has a name that is no version") +
+               reason("the update 2020a.9.0.0 is older than the current data set 2020a.9.0")),
+    refuse("2018b.1.0", file(updates + "2018b.1.0/icutz/icutz45l.dat", ""),
+           reason("the update 2018b.1.0 has schema 45l; the system partition has schema 44l") +
+               reason("the update 2018b.1.0 is older than the current data set 2020a.9.0")),
+    refuse("02020a.9.0", update(updates + "02020a.9.0"),
+           reason("the update 02020a.9.0 is not newer than the current data set 2020a.9.0")),
+    refuse("2020a.9.0", file(version, "2020b"),
+           reason("the current data set 2020a.9.0 is older than the system partition 2020b.1.0")),
+    refuse("missing", {}, reason("there is no directory " + updates + "missing")),
+    refuse("2020b.1.0", folder(third),
+           no_icu("2020b.1.0") + reason("there is no directory " + third + "/icutz")),
+    refuse("2020b.1.0",
+           link_to(third + "/icutz/icutz44l.dat", "x") + folder(third + "/icutz/icutz45l.dat"),
+           no_icu("2020b.1.0") + reason("icutz45l.dat is no file") +
+               reason("icutz44l.dat is a symbolic link")),
+    refuse("2020b.1.0", update(third),
+           no_icu("2020b.1.0") + reason("icutz44l.dat is closed to others"),
+           [] { chmod((third + "/icutz/icutz44l.dat").c_str(), 0640); }),
+    refuse("2020b.1.0", update(third),
+           no_icu("2020b.1.0") + reason(third + " is closed to a start: user 0, mode 0"),
+           [] { chmod(third.c_str(), 0); }),
+    refuse("2147483648a", update(updates + "2147483648a"), reason("the latest update " + large)),
+    {on_first,
+     report{"Verdict: refused"} +
+         reason("the latest update cannot be used: tz is not below " + updates),
+     "exit 1", "tz"},
+};
+
+TEST(status, says_why) {
+  for (const auto& row : questions) {
+    SCOPED_TRACE(row.answer.back());
+    lay_out(row.before);
+    row.prepare();
+    const bool is_judged = !row.update.empty();
+    report lines;
+    for (const string& line : ask(is_judged ? report{"--query", row.update} : report{"--query"})) {
+      const string key = line.substr(0, line.find(':'));
+      const bool is_wanted =
+          is_judged ? key == "Verdict" || key == "Reason" : key == "Because" || key == "Remark";
+      // How this machine has its own zone is not the device's.
+      if ((is_wanted && line.find("/etc/localtime") == string::npos) || line.starts_with("exit "))
+        lines.push_back(line);
+    }
+    EXPECT_EQ(lines, row.answer + report{row.ends});
+  }
+}
+
+// An image that has a device's paths.
+void make_image(const string& image) {
+  for (const string path : {"/var/db", "/usr/share"}) {
+    std::filesystem::create_directories(image + path);
+    ASSERT_EQ(mount(path.c_str(), (image + path).c_str(), "", MS_BIND | MS_REC, nullptr), 0);
+  }
+  std::filesystem::create_directory(image + "/etc");
+  std::filesystem::create_symlink("../" + zone, image + "/etc/localtime");
+}
+
+TEST(status, reports_on_an_image) {
+  const string image = "/var/image";
+  const string refused = updates + "2020c.1.0";
+  lay_out(on_second + link_to(latest, refused) + folder(refused) + file(version, "2020b\x1b") +
+          link_to(updates + "part", "nowhere"));
+  make_image(image);
+  EXPECT_EQ(
+      ask({"--root=" + image}),
+      (report{"system      2020b?.1.0, schema 44l",
+              "current     2020a.10.0, schema 44l",
+              "latest      2020c.1.0, schema none",
+              "zoneinfo    " + second + "/zoneinfo",
+              "icutz       " + second + "/icutz",
+              "localtime   " + zoneinfo + "/Asia/Tokyo",
+              "next start  keeps 2020a.10.0: " + second + "/zoneinfo",
+              "because     the update 2020c.1.0 has no ICU data file that counts; the system",
+              "            partition has schema 44l",
+              "            there is no directory /var/db/timezone/tz/2020c.1.0/icutz",
+              "will warn   Cannot parse version string 2020b?.1.0, results.size() = 0",
+              "            Cannot parse version string 2020b?.1.0",
+              "            No ICU schema found for /var/db/timezone/tz/2020c.1.0",
+              "            New update not compatible or older version: 2020c.1.0 vs. 2020a.10.0",
+              "remarks     the system partition has no version: 2020b?.1.0 is older than any",
+              "            update",
+              "updates     2020a.9.0 unused",
+              "            2020a.10.0 current",
+              "            2020c.1.0 refused: the update 2020c.1.0 has no ICU data file that",
+              "            counts; the system partition has schema 44l",
+              "exit 0"}));
+  EXPECT_EQ(ask({"--root", image, refused}).front(), "refused     " + refused);
+}
+
+TEST(status, is_asked_wrongly_or_cannot_tell) {
+  lay_out(on_first);
+  const string usage = "usage: tzdata-status [--query] [--root=DIRECTORY] [UPDATE]";
+  EXPECT_EQ(ask({"--help"}).front(), usage);
+  EXPECT_EQ(ask({"--help"}).back(), "exit 0");
+  EXPECT_EQ(ask({"--version"}).back(), "exit 0");
+  for (const report& wrong : {report{"one", "two"}, report{""}, report{"/"}})
+    EXPECT_EQ(ask(wrong), (report{usage, "exit 2"}));
+  for (const report& wrong : {report{"--root=" + second + "/x"}, report{"-x"}})
+    EXPECT_EQ(ask(wrong).back(), "exit 2");
+  // What an ordinary user may not look at, or read, although the unit may.
+  const std::array<string, 3> rows[] = {
+      {"look at", "statx", second + "/zoneinfo"},
+      {"read", "openat", version},
+      {"read", "openat", first + "/icutz"},
+      {"read", "openat", "/var/db/icu"},
+  };
+  for (const auto& [what, call, path] : rows) {
+    lay_out(on_first + folder("/var/db/icu"));
+    EXPECT_EQ(
+        ask({}, {"-P", path, "-e", "inject=" + call + ":error=EACCES"}),
+        (report{"tzdata-status: cannot be told: you may not " + what + " " + path, "exit 2"}));
+  }
+}
+
+}  // namespace
