@@ -53,6 +53,7 @@ class olm_trial {
   // Throws if the user of this program may not look at what the outcome depends on.
   void require_told() const;
 
+  bool is_for_user = false;  // goes by the rights of this program's user instead of the unit's
   std::vector<std::string> warnings;   // without the program's name and the text of errno
   std::vector<std::string> obstacles;  // what the device or the unit's rights did not allow
   std::vector<std::string> written;    // the paths of the files that were to be written
@@ -69,7 +70,7 @@ class olm_trial {
 
  private:
   // What the unit may do with an entry, as the bits of a mode.
-  enum right : unsigned { search = 1, write_in = 2, read = 4 };
+  enum right : unsigned { search = 1, change = 2, look_into = 4 };
 
   [[nodiscard]] olm_entry look_up(const std::string& place);
   [[nodiscard]] olm_entry look_up_directory(const olm_entry& entry);

@@ -160,12 +160,6 @@ string describe_start(const device_facts& facts) {
   return "keeps " + (current != nullptr ? current->name : "");
 }
 
-bool stays_in_use(const device_facts& facts) {
-  const start_forecast& start = facts.start;
-  return !start.installs && start.status && facts.current.data &&
-         facts.current.path == facts.latest.path && !start.zoneinfo.next.is_new;
-}
-
 sentences explain_latest(const device_facts& facts) {
   if (!facts.system.data) return explain_problem("the system partition", facts.system);
   if (facts.latest.path.empty() && facts.latest.problem.empty())
@@ -174,8 +168,6 @@ sentences explain_latest(const device_facts& facts) {
   const olm_dataset* const current = find_weighed(facts);
   if (current == nullptr) return explain_problem("the current data set", facts.current);
 
-  const int error = olm_trial().find(facts.latest.path, true).error;
-  if (error == ENOENT || error == ENOTDIR) return {"there is no directory " + facts.latest.path};
   const olm_dataset& latest = *facts.latest.data;
   const string what = "the update " + latest.name;
   sentences lines;
@@ -186,6 +178,8 @@ sentences explain_latest(const device_facts& facts) {
       lines.push_back("it has no " + file + ", which a start does not ask for");
     return lines;
   }
+  const int error = olm_trial().find(latest.path, true).error;
+  if (error == ENOENT || error == ENOTDIR) return {"there is no directory " + latest.path};
   if (latest.same_path(*current) && may_stay(*current, *facts.system.data))
     return {what + " is the current data set"};
   if (latest.same_path(*current)) return explain_current(facts.latest, *facts.system.data);

@@ -21,8 +21,5 @@ using sentences = std::vector<std::string>;
 // Why the latest update is taken into use or not.
 [[nodiscard]] sentences explain_latest(const device_facts& facts);
 
-// Whether the latest update is in use already and stays so.
-[[nodiscard]] bool stays_in_use(const device_facts& facts);
-
 // What is not as it should be on the device, and what the next start makes of it.
 [[nodiscard]] sentences list_remarks(const device_facts& facts);

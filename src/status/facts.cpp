@@ -30,22 +30,33 @@ dataset_facts gather_dataset(const std::function<std::string()>& find_path) {
   return facts;
 }
 
-std::vector<update_facts> gather_updates(const std::string& latest, bool installs) {
+// A data set that a link names: by the path that a start reads from it, or by where it really
+// leads.
+struct named_dataset {
+  std::string path;
+  std::string place;
+
+  [[nodiscard]] bool is(const std::string& other_path, const olm_entry& directory) const {
+    return path == other_path || (place + '/').starts_with(directory.place + '/');
+  }
+};
+
+std::vector<update_facts> gather_updates(const device_facts& facts, const std::string& latest) {
   olm_trial trial;
+  trial.is_for_user = true;
   if (!latest.empty()) trial.put_link(latest_link, latest);
-  const std::string current_place = trial.find(zoneinfo_link, true).place;
-  const std::string latest_place = trial.find(latest_link, true).place;
+  const named_dataset current{facts.current.path, trial.find(zoneinfo_link, true).place};
+  const named_dataset next{facts.latest.path, trial.find(latest_link, true).place};
   std::vector<update_facts> updates;
   for (const olm_entry& entry : trial.list(update_area)) {
     const olm_entry directory = trial.find(entry.place, true);
     if (!directory.is(S_IFDIR)) continue;
-    update_facts update{.name = entry.place.substr(entry.place.rfind('/') + 1), .state = "unused"};
-    if (current_place.starts_with(directory.place + '/')) {
-      update.state = "current";
-    } else if (directory.place == latest_place) {
-      update.state = installs ? "waiting" : "refused";
-    }
-    updates.push_back(update);
+    const std::string name = entry.place.substr(entry.place.rfind('/') + 1);
+    const std::string path = update_area + name;
+    updates.push_back({name, current.is(path, directory) ? "current"
+                             : !next.is(path, directory) ? "unused"
+                             : facts.start.installs      ? "waiting"
+                                                         : "refused"});
   }
   std::sort(updates.begin(), updates.end(), [](const auto& one, const auto& other) {
     return strverscmp(one.name.c_str(), other.name.c_str()) < 0;
@@ -64,8 +75,11 @@ device_facts gather_facts(const std::string& latest) {
   facts.start = forecast_start(latest);
   facts.system = gather_dataset([] { return std::string(); });
   facts.current = gather_dataset(current_dataset_path);
-  facts.latest = gather_dataset([&] { return latest.empty() ? latest_dataset_path() : latest; });
+  facts.latest = gather_dataset([&] {
+    if (!latest.empty()) olm_trial::get().put_link(latest_link, latest);
+    return latest_dataset_path();
+  });
   if (facts.latest.path.empty()) facts.latest.data.reset();
-  facts.updates = gather_updates(latest, facts.start.installs);
+  facts.updates = gather_updates(facts, latest);
   return facts;
 }

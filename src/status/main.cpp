@@ -43,31 +43,50 @@ string clean(string text) {
   return text;
 }
 
+struct question {
+  bool is_query = false;
+  const char* root = nullptr;
+  string update;
+  bool had_slash = false;  // at the end of the update's path
+};
+
 struct answer {
   device_facts facts;
+  int status = EXIT_SUCCESS;
+  string verdict;  // on the update that was asked about, if any
   sentences because;
   sentences remarks;
   sentences reasons;  // for what becomes of the latest update
 };
 
-answer find_answer(const string& update) {
-  const device_facts facts = gather_facts(update);
-  return {facts, explain_start(facts), list_remarks(facts), explain_latest(facts)};
+// What becomes of `update`. Of a longer path, the start reads only the first bytes.
+const char* get_verdict(const device_facts& facts, const string& update) {
+  const string& target = facts.start.zoneinfo.next.target;
+  if (facts.start.installs) return facts.latest.path == update ? "used" : "refused";
+  return target.substr(0, target.rfind('/')) == update ? "in-use" : "refused";
 }
 
-// What becomes of the update that was asked about.
-const char* get_verdict(const device_facts& facts) {
-  if (facts.start.installs) return "used";
-  return stays_in_use(facts) ? "in-use" : "refused";
+int get_status(const start_forecast& start) {
+  const bool changes_nothing = start.zoneinfo.now.equals(start.zoneinfo.next) &&
+                               start.icutz.now.equals(start.icutz.next) &&
+                               start.localtime.now.equals(start.localtime.next);
+  return start.status == EXIT_SUCCESS && changes_nothing ? EXIT_SUCCESS : EXIT_FAILURE;
 }
 
-int get_status(const device_facts& facts, bool is_asked_of_update) {
-  const start_forecast& start = facts.start;
-  const bool is_used = start.installs || stays_in_use(facts);
-  const bool all_stays =
-      start.status == EXIT_SUCCESS && start.zoneinfo.now.equals(start.zoneinfo.next) &&
-      start.icutz.now.equals(start.icutz.next) && start.localtime.now.equals(start.localtime.next);
-  return (is_asked_of_update ? is_used : all_stays) ? EXIT_SUCCESS : EXIT_FAILURE;
+answer find_answer(const question& asked) {
+  answer answer;
+  answer.facts = gather_facts(asked.update);
+  answer.because = explain_start(answer.facts);
+  answer.remarks = list_remarks(answer.facts);
+  answer.reasons = explain_latest(answer.facts);
+  answer.status = get_status(answer.facts.start);
+  if (asked.update.empty()) return answer;
+  answer.verdict = get_verdict(answer.facts, asked.update);
+  answer.status = answer.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
+  if (asked.had_slash)
+    answer.reasons.emplace_back(
+        "the target of tz_latest must not end in a slash, as this path did");
+  return answer;
 }
 
 // --- For scripts ---
@@ -85,7 +104,7 @@ void print_keys_of_dataset(const string& which, const dataset_facts& facts) {
   print_key((which + "-Schema").c_str(), facts.data ? get_icu(*facts.data).schema : "");
 }
 
-void print_query(const answer& answer, bool is_asked_of_update) {
+void print_query(const answer& answer) {
   const device_facts& facts = answer.facts;
   const start_forecast& start = facts.start;
   print_key("Zoneinfo", start.zoneinfo.now.target);
@@ -103,8 +122,8 @@ void print_query(const answer& answer, bool is_asked_of_update) {
   print_keys("Remark", answer.remarks);
   for (const update_facts& update : facts.updates)
     print_key("Update", update.name + ' ' + update.state);
-  if (!is_asked_of_update) return;
-  print_key("Verdict", get_verdict(facts));
+  if (answer.verdict.empty()) return;
+  print_key("Verdict", answer.verdict);
   print_keys("Reason", answer.reasons);
 }
 
@@ -163,13 +182,6 @@ void print_report(const answer& answer) {
 
 // --- What was asked ---
 
-struct question {
-  bool is_query = false;
-  const char* root = nullptr;
-  string update;
-  bool had_slash = false;  // at the end of the update's path
-};
-
 [[noreturn]] void end(const string& text) {
   std::fputs(text.c_str(), stdout);
   std::exit(std::fflush(stdout) == 0 ? EXIT_SUCCESS : cannot_be_told);
@@ -217,24 +229,20 @@ question read_question(int count, char* arguments[]) {
 
 int main(int count, char* arguments[]) {
   const question asked = read_question(count, arguments);
-  const bool is_asked_of_update = !asked.update.empty();
   if (asked.root != nullptr && (chroot(asked.root) != 0 || chdir("/") != 0))
     err(cannot_be_told, "--root=%s", asked.root);
   try {
-    answer answer = find_answer(asked.update);
-    if (asked.had_slash)
-      answer.reasons.emplace_back(
-          "the target of tz_latest must not end in a slash, as this path did");
+    const answer answer = find_answer(asked);
     if (asked.is_query) {
-      print_query(answer, is_asked_of_update);
-    } else if (is_asked_of_update) {
-      print_text(get_verdict(answer.facts), asked.update);
-      print_texts("", answer.reasons);
-    } else {
+      print_query(answer);
+    } else if (answer.verdict.empty()) {
       print_report(answer);
+    } else {
+      print_text(answer.verdict.c_str(), asked.update);
+      print_texts("", answer.reasons);
     }
     if (std::fflush(stdout) != 0) err(cannot_be_told, "standard output");
-    return get_status(answer.facts, is_asked_of_update);
+    return answer.status;
   } catch (const std::exception& failure) {
     errx(cannot_be_told, "cannot be told: %s", clean(failure.what()).c_str());
   }
