@@ -116,9 +116,10 @@ TEST(olm_dataset, path_from_link) {
   EXPECT_EQ(dataset_path_from_link(at::updates + "x/"), at::updates + "x");
   for (const string& bad :
        {string(), update, at::updates, at::updates + "/zoneinfo", "/tmp" + update,
-        at::system_zoneinfo + "/", string("/usr/share/zoneinfo")})
+        at::system_zoneinfo + "/", string("/usr/share/zoneinfo")}) {
     EXPECT_TRUE(hear([&] { static_cast<void>(dataset_path_from_link(bad)); }).ends_with("-1"))
         << bad;
+  }
 }
 
 // A warning ends with the text of the call that failed, and its errno is thrown.
@@ -131,9 +132,10 @@ TEST(failures, keep_errno) {
       {[] { static_cast<void>(olm_icu(at::updates + "x")); }, ENOMEM},
   };
   no_memory_for_walks = true;
-  for (const auto& [action, error] : rows)
+  for (const auto& [action, error] : rows) {
     EXPECT_TRUE(
         hear(action).ends_with(": " + string(strerror(error)) + "\n" + std::to_string(error)));
+  }
   no_memory_for_walks = false;
 }
 

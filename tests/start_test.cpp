@@ -241,6 +241,13 @@ report forecast() {
   return lines;
 }
 
+// How the line for people on the next start ends.
+string forecast_target() {
+  for (const string& line : ask({}))
+    if (line.starts_with("next start  ")) return line.substr(line.rfind(": ") + 2);
+  return "no such line";
+}
+
 // The same of a start that has been made.
 report describe(const report& heard) {
   report lines = {"Next-Zoneinfo: " + follow(zoneinfo), "Next-Icutz: " + follow(icutz),
@@ -263,12 +270,15 @@ TEST(start, each_case) {
     lay_out(row.before);
     row.prepare();
     const report forecasted = forecast();
+    const string forecasted_target = forecast_target();
     EXPECT_EQ(look(), change({}, row.before));
     const report heard = start(row.tracing);
     EXPECT_EQ(heard, row.says + report{row.ends});
     EXPECT_EQ(look(), change(change({}, row.before), row.changes));
     if (row.tracing.empty()) {
       EXPECT_EQ(forecasted, describe(heard));
+      EXPECT_EQ(forecasted.front(),
+                "Next-Zoneinfo: " + (forecasted_target == "none" ? "" : forecasted_target));
     }
   }
 }

@@ -82,8 +82,8 @@ TEST_P(sweep, leaves_a_whole_data_set) {
         EXPECT_EQ(healed.zoneinfo, undisturbed.zoneinfo);
         EXPECT_EQ(heal(), healed);
         // What stays wrong is known: a kill between two steps that belong together.
-        found["kills leave the ICU link wrong"] += healed.icutz != undisturbed.icutz;
-        found["kills lose the zone"] += healed.zone != undisturbed.zone;
+        found["kills leave the ICU link wrong"] += healed.icutz != undisturbed.icutz ? 1 : 0;
+        found["kills lose the zone"] += healed.zone != undisturbed.zone ? 1 : 0;
         EXPECT_TRUE(healed.icutz == undisturbed.icutz || left.zoneinfo == undisturbed.zoneinfo);
         EXPECT_TRUE(healed.zone == undisturbed.zone || left.zone.empty());
         continue;
@@ -91,9 +91,9 @@ TEST_P(sweep, leaves_a_whole_data_set) {
       ++found["faults"];
       EXPECT_TRUE(left.lead_to_whole_data_set());
       EXPECT_EQ(heard.back(), left.zone.empty() ? "exit 1" : "exit 0");
-      found["faults have a lasting effect"] += healed != undisturbed;
+      found["faults have a lasting effect"] += healed != undisturbed ? 1 : 0;
       const bool is_apart = left.icutz != left.own_icutz() && left.icutz != undisturbed.icutz;
-      found["faults leave the ICU link wrong"] += is_apart;
+      found["faults leave the ICU link wrong"] += is_apart ? 1 : 0;
       EXPECT_TRUE(!is_apart || has(call, "unlink(\"/var/db/timezone/icutz\""));
     }
   }

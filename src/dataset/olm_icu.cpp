@@ -35,6 +35,10 @@ std::string read_schema(const char* name) {
   return std::regex_match(name, match, pattern) ? match[1] : std::string();
 }
 
+bool is_schema(const std::string& text) {
+  return read_schema(("icutz" + text + ".dat").c_str()) == text;
+}
+
 olm_icu::olm_icu() : olm_icu(std::string()) {}
 
 olm_icu::olm_icu(const std::string& path)

@@ -19,6 +19,9 @@ inline constexpr const char* schema_file = "/icutzformat.txt";
 // Prints nothing.
 [[nodiscard]] std::string read_schema(const char* name);
 
+// Whether `text` has the form of a schema. Prints nothing.
+[[nodiscard]] bool is_schema(const std::string& text);
+
 // The ICU data of a data set. Its schema is the data's format on disk, such as 44l.
 class olm_icu final : public olm_dataset_component {
  public:

@@ -12,21 +12,19 @@ start_forecast forecast_start(const std::string& latest) {
   start_forecast forecast;
   olm_trial trial;
   // What the links are is told even if a start could not see it.
-  trial.is_for_user = true;
+  trial.go_by_rights_of_user(true);
   forecast.zoneinfo.now = trial.find(zoneinfo_link);
   forecast.icutz.now = trial.find(icutz_link);
   forecast.localtime.now = trial.find(localtime_link);
   if (!latest.empty()) trial.put_link(latest_link, latest);
-  trial.is_for_user = false;
+  trial.go_by_rights_of_user(false);
   const int status = run_start();
   trial.require_told();
-  forecast.endless = trial.endless;
-  if (forecast.endless.empty()) forecast.status = status;
-  forecast.warnings = trial.warnings;
-  forecast.obstacles = trial.obstacles;
-  const auto& written = trial.written;
+  forecast.record = trial.get_record();
+  if (forecast.record.endless.empty()) forecast.status = status;
+  const auto& written = forecast.record.written;
   forecast.installs = std::find(written.begin(), written.end(), version_record) != written.end();
-  trial.is_for_user = true;
+  trial.go_by_rights_of_user(true);
   forecast.zoneinfo.next = trial.find(zoneinfo_link);
   forecast.icutz.next = trial.find(icutz_link);
   forecast.localtime.next = trial.find(localtime_link);

@@ -15,14 +15,12 @@ struct link_forecast {
 
 struct start_forecast {
   std::optional<int> status;  // the exit status; none where the start does not end by itself
-  std::string endless;        // the file at which it then waits, or runs out of memory
   link_forecast zoneinfo;
   link_forecast icutz;
   link_forecast localtime;
-  bool installs = false;               // it takes the latest update into use
-  bool zone_exists = false;            // after it, the local-time link leads to a file
-  std::vector<std::string> warnings;   // what it prints, without its name and the text of errno
-  std::vector<std::string> obstacles;  // what the device or the unit's rights do not allow it
+  bool installs = false;     // it takes the latest update into use
+  bool zone_exists = false;  // after it, the local-time link leads to a file
+  trial_record record;
 };
 
 // Forecasts the next start. `latest`, if not empty, stands for what tz_latest holds.

@@ -42,27 +42,41 @@ std::string describe_rights(const olm_entry& entry) {
   return "user " + std::to_string(entry.status.stx_uid) + ", mode " + mode.data();
 }
 
+// Takes the first name off a path, and the slashes before it; empty at the path's end.
+std::string take_name(std::string& path) {
+  path.erase(0, path.find_first_not_of('/'));
+  std::string name = path.substr(0, path.find('/'));
+  path.erase(0, name.size());
+  return name;
+}
+
 struct directory_closer {
   void operator()(DIR* directory) const { closedir(directory); }
 };
 
 }  // namespace
 
-olm_trial* olm_trial::innermost = nullptr;
-
 bool olm_entry::equals(const olm_entry& other) const {
   constexpr unsigned kind = S_IFMT;
   return (status.stx_mode & kind) == (other.status.stx_mode & kind) && target == other.target;
 }
 
-olm_trial::olm_trial() : outer_(std::exchange(innermost, this)) {}
+olm_trial*& olm_trial::get_innermost() {
+  // NOLINTNEXTLINE(cppcoreguidelines-avoid-non-const-global-variables): for functions of the C kind
+  static olm_trial* innermost = nullptr;
+  return innermost;
+}
 
-olm_trial::~olm_trial() { innermost = outer_; }
+olm_trial::olm_trial() : outer_(std::exchange(get_innermost(), this)) {}
+
+olm_trial::~olm_trial() { get_innermost() = outer_; }
 
 olm_trial& olm_trial::get() {
-  innermost->require_told();
-  if (!innermost->endless.empty()) throw std::runtime_error(innermost->endless);
-  return *innermost;
+  olm_trial& innermost = *get_innermost();
+  innermost.require_told();
+  if (const std::string& end = innermost.record_.endless; !end.empty())
+    throw std::runtime_error(end);
+  return innermost;
 }
 
 void olm_trial::require_told() const {
@@ -75,13 +89,13 @@ void olm_trial::leave_untold(const std::string& why) {
 }
 
 void olm_trial::end(const std::string& place) {
-  endless = place;
+  record_.endless = place;
   throw std::runtime_error(place);
 }
 
 void olm_trial::note(const std::string& obstacle) {
-  if (std::find(obstacles.begin(), obstacles.end(), obstacle) == obstacles.end())
-    obstacles.push_back(obstacle);
+  auto& all = record_.obstacles;
+  if (std::find(all.begin(), all.end(), obstacle) == all.end()) all.push_back(obstacle);
 }
 
 // What stands at `place`.
@@ -107,12 +121,18 @@ olm_entry olm_trial::look_up_directory(const olm_entry& entry) {
   return look_up(get_parent(entry.place));
 }
 
+// What stands in `directory` under `name`.
+olm_entry olm_trial::look_up_in(const olm_entry& directory, const std::string& name) {
+  if (name == ".") return directory;
+  return name == ".." ? look_up_directory(directory) : look_up(directory.place + '/' + name);
+}
+
 bool olm_trial::may(const olm_entry& entry, unsigned rights) {
-  if (is_for_user) return true;  // what he may not, fails by itself
+  if (is_for_user_) return true;  // what he may not, fails by itself
   const bool is_roots = entry.status.stx_uid == 0;
-  // Here the mode does not tell all.
-  if (!is_roots && lgetxattr(get_path(entry.place), "system.posix_acl_access", nullptr, 0) > 0)
-    leave_untold(entry.place + " has an access control list");
+  const bool has_list =
+      !is_roots && lgetxattr(get_path(entry.place), "system.posix_acl_access", nullptr, 0) > 0;
+  if (has_list) leave_untold(entry.place + " has an access control list");
   const unsigned shift = is_roots ? 6 : entry.status.stx_gid == 0 ? 3 : 0;
   if ((entry.status.stx_mode >> shift & rights) == rights) return true;
   note(get_path(entry.place) + (" is closed to a start: " + describe_rights(entry)));
@@ -124,13 +144,10 @@ olm_entry olm_trial::find(const std::string& path, bool follows) {
   std::string rest = path;
   olm_entry at = look_up("");
   for (int links = 0;;) {
-    rest.erase(0, rest.find_first_not_of('/'));
-    if (rest.empty()) return at;
-    const std::string name = rest.substr(0, rest.find('/'));
-    rest.erase(0, name.size());
+    const std::string name = take_name(rest);
+    if (name.empty()) return at;
     if (!may(at, search)) return {.error = EACCES};
-    if (name == ".") continue;
-    olm_entry entry = name == ".." ? look_up_directory(at) : look_up(at.place + '/' + name);
+    olm_entry entry = look_up_in(at, name);
     const bool is_last = rest.empty();
     if (entry.is(S_IFLNK) && (follows || !is_last)) {
       if (++links > most_links) return {.error = ELOOP};
@@ -220,7 +237,7 @@ int olm_trial::unlink(const std::string& path) {
 
 int olm_trial::remove(const std::string& path) {
   const olm_entry entry = find(path);
-  const std::vector<std::string> before = obstacles;
+  const std::vector<std::string> before = record_.obstacles;
   int error = refuse_removing(entry);
   if (error == 0 && entry.is(S_IFDIR)) {
     std::error_code failure;
@@ -228,7 +245,7 @@ int olm_trial::remove(const std::string& path) {
     if (failure) leave_untold("you may not read " + entry.place);
   }
   if (error == 0) put(entry.place, 0, "");
-  obstacles = before;  // nobody hears of this failure
+  record_.obstacles = before;  // nobody hears of this failure
   return error;
 }
 
@@ -241,6 +258,7 @@ int olm_trial::symlink(const std::string& target, const std::string& path) {
 }
 
 int olm_trial::write(const std::string& path, bool reads_too) {
+  if (!reads_too) record_.written.push_back(path);
   const olm_entry entry = find(path, true);
   if (entry.error != 0) {
     const int error = refuse_making(entry);

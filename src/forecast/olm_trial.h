@@ -22,6 +22,14 @@ struct olm_entry {
   [[nodiscard]] bool equals(const olm_entry& other) const;
 };
 
+// What a trial has met.
+struct trial_record {
+  std::vector<std::string> warnings;   // without the program's name and the text of errno
+  std::vector<std::string> obstacles;  // what the device or the unit's rights did not allow
+  std::vector<std::string> written;    // the paths of the files that were to be written
+  std::string endless;                 // the file at which a start would wait or run out of memory
+};
+
 // A start, or a part of one, that changes nothing. While a trial exists, the functions of
 // fs/device.h look at the device with the unit's rights, whoever runs the program: those of root
 // without capabilities. What they are to change, the trial remembers, and sees from then on. All
@@ -53,11 +61,10 @@ class olm_trial {
   // Throws if the user of this program may not look at what the outcome depends on.
   void require_told() const;
 
-  bool is_for_user = false;  // goes by the rights of this program's user instead of the unit's
-  std::vector<std::string> warnings;   // without the program's name and the text of errno
-  std::vector<std::string> obstacles;  // what the device or the unit's rights did not allow
-  std::vector<std::string> written;    // the paths of the files that were to be written
-  std::string endless;                 // the file at which a start would wait or run out of memory
+  // From now on, goes by the rights of this program's user instead of the unit's, or back.
+  void go_by_rights_of_user(bool is_for_user) { is_for_user_ = is_for_user; }
+
+  [[nodiscard]] const trial_record& get_record() const { return record_; }
 
   // What fs/device.h asks for; for its second implementation alone. An int is 0 or an errno.
   [[nodiscard]] static olm_trial& get();
@@ -67,12 +74,14 @@ class olm_trial {
   [[nodiscard]] int write(const std::string& path, bool reads_too);
   // The path to open for reading `path`; empty where a start finds nothing to read.
   [[nodiscard]] std::string find_readable(const std::string& path);
+  void warn(const std::string& message) { record_.warnings.push_back(message); }
 
  private:
   // What the unit may do with an entry, as the bits of a mode.
   enum right : unsigned { search = 1, change = 2, look_into = 4 };
 
   [[nodiscard]] olm_entry look_up(const std::string& place);
+  [[nodiscard]] olm_entry look_up_in(const olm_entry& directory, const std::string& name);
   [[nodiscard]] olm_entry look_up_directory(const olm_entry& entry);
   [[nodiscard]] bool may(const olm_entry& entry, unsigned rights);
   [[nodiscard]] int refuse_writing(const olm_entry& entry);
@@ -84,8 +93,11 @@ class olm_trial {
   [[noreturn]] void leave_untold(const std::string& why);
   [[noreturn]] void end(const std::string& place);
 
+  [[nodiscard]] static olm_trial*& get_innermost();
+
+  trial_record record_;
   std::map<std::string, olm_entry> changes_;  // by their places
   std::string untold_;
+  bool is_for_user_ = false;
   olm_trial* outer_;
-  static olm_trial* innermost;
 };

@@ -52,13 +52,11 @@ std::ifstream open_to_read(const std::string& path) {
 }
 
 std::ofstream open_to_write(const std::string& path) {
-  olm_trial& trial = olm_trial::get();
-  trial.written.push_back(path);
-  static_cast<void>(trial.write(path, false));
+  static_cast<void>(olm_trial::get().write(path, false));
   return {};
 }
 
-bool walk(std::string directory, const file_visitor& visit) {
+bool walk(const std::string& directory, const file_visitor& visit) {
   const auto entries = olm_trial::get().list(directory);
   static_cast<void>(std::any_of(entries.begin(), entries.end(), [&](const olm_entry& entry) {
     const char* name = &entry.place[entry.place.rfind('/') + 1];
@@ -67,7 +65,7 @@ bool walk(std::string directory, const file_visitor& visit) {
   return true;
 }
 
-// NOLINTNEXTLINE(cert-dcl50-cpp): as the C library's
+// NOLINTBEGIN(cert-dcl50-cpp,cppcoreguidelines-pro-bounds-array-to-pointer-decay): as in C
 void warn(const char* format, ...) {
   std::va_list arguments;
   va_start(arguments, format);
@@ -77,7 +75,8 @@ void warn(const char* format, ...) {
   static_cast<void>(std::vsnprintf(message.data(), message.size() + 1, format, again));
   va_end(again);
   va_end(arguments);
-  olm_trial::get().warnings.push_back(message);
+  olm_trial::get().warn(message);
 }
+// NOLINTEND(cert-dcl50-cpp,cppcoreguidelines-pro-bounds-array-to-pointer-decay)
 
 }  // namespace device

@@ -53,8 +53,9 @@ std::ifstream open_to_read(const std::string& path) { return std::ifstream(path)
 
 std::ofstream open_to_write(const std::string& path) { return std::ofstream(path); }
 
-bool walk(std::string directory, const file_visitor& visit) {
-  const std::array<char*, 2> roots = {directory.data(), nullptr};
+bool walk(const std::string& directory, const file_visitor& visit) {
+  std::string root = directory;
+  const std::array<char*, 2> roots = {root.data(), nullptr};
   const std::unique_ptr<FTS, walk_closer> entries(
       fts_open(roots.data(), FTS_COMFOLLOW | FTS_PHYSICAL | FTS_XDEV, nullptr));
   if (!entries) return false;
@@ -64,12 +65,13 @@ bool walk(std::string directory, const file_visitor& visit) {
   return true;
 }
 
-// NOLINTNEXTLINE(cert-dcl50-cpp): as the C library's
+// NOLINTBEGIN(cert-dcl50-cpp,cppcoreguidelines-pro-bounds-array-to-pointer-decay): as in C
 void warn(const char* format, ...) {
   std::va_list arguments;
   va_start(arguments, format);
   vwarn(format, arguments);
   va_end(arguments);
 }
+// NOLINTEND(cert-dcl50-cpp,cppcoreguidelines-pro-bounds-array-to-pointer-decay)
 
 }  // namespace device

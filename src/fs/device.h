@@ -41,7 +41,7 @@ using file_visitor = std::function<bool(const char* name, mode_t mode)>;
 // Calls `visit` for each regular file directly in `directory`, which may be a link, in the
 // directory's own order. Gives false, with errno set, when the walk cannot be started; a directory
 // that is missing or closed has no files.
-[[nodiscard]] bool walk(std::string directory, const file_visitor& visit);
+[[nodiscard]] bool walk(const std::string& directory, const file_visitor& visit);
 
 // As the C library's: prints a line on the standard error stream, with the program's name in front
 // and the text of errno at its end.

@@ -85,8 +85,8 @@ sentences explain_current(const dataset_facts& current, const olm_dataset& syste
 // Where the ICU link belongs while the zoneinfo link is like this: nowhere with the system
 // partition's zone files.
 string get_own_icutz(const olm_entry& zoneinfo) {
-  const string path = zoneinfo.target.substr(0, zoneinfo.target.rfind('/'));
-  return zoneinfo.target.starts_with(update_area) ? olm_icu(path).directory : "";
+  return zoneinfo.target.starts_with(update_area) ? olm_icu(get_parent(zoneinfo.target)).directory
+                                                  : "";
 }
 
 bool are_apart(const olm_entry& zoneinfo, const olm_entry& icutz) {
@@ -96,12 +96,14 @@ bool are_apart(const olm_entry& zoneinfo, const olm_entry& icutz) {
 sentences remark_on_halves(const start_forecast& start) {
   olm_trial trial;
   if (!start.zoneinfo.next.is(S_IFLNK)) return {};
-  if (are_apart(start.zoneinfo.next, start.icutz.next))
+  if (are_apart(start.zoneinfo.next, start.icutz.next)) {
     return {"after the next start, the zone files and the ICU data do not belong together: " +
             describe(start.zoneinfo.next) + " and " + describe(start.icutz.next)};
-  if (are_apart(start.zoneinfo.now, start.icutz.now))
+  }
+  if (are_apart(start.zoneinfo.now, start.icutz.now)) {
     return {
         "the zone files and the ICU data do not belong together now; the next start mends that"};
+  }
   return {};
 }
 
@@ -110,9 +112,10 @@ sentences remark_on_zone(const start_forecast& start) {
   const string after = describe(start.localtime.next);
   if (start.localtime.next.error != 0) return {"after the next start, there is no local-time link"};
   sentences lines;
-  if (!start.localtime.now.equals(start.localtime.next))
+  if (!start.localtime.now.equals(start.localtime.next)) {
     lines.push_back("the local-time link is " + before + "; the next start makes it lead to " +
                     after);
+  }
   if (!start.localtime.next.target.starts_with(zoneinfo_link + string("/")))
     lines.push_back("the local-time link does not go through the zoneinfo link: " + after);
   if (!start.zone_exists)
@@ -132,13 +135,15 @@ sentences remark_on_system_localtime() {
 sentences remark_on_system(const olm_dataset& system) {
   sentences lines;
   const string& schema = get_icu(system).schema;
-  if (system.version == olm_version())
+  if (system.version == olm_version()) {
     lines.push_back("the system partition has no version: " + system.name +
                     " is older than any update");
-  if (schema.empty())
+  }
+  if (schema.empty()) {
     lines.emplace_back("the system partition has no schema: only an update without ICU data fits");
-  else if (read_schema(("icutz" + schema + ".dat").c_str()) != schema)
+  } else if (!is_schema(schema)) {
     lines.push_back("the system partition's schema is none, so no update fits: " + schema);
+  }
   return lines;
 }
 
@@ -183,34 +188,37 @@ sentences explain_latest(const device_facts& facts) {
   if (latest.same_path(*current) && may_stay(*current, *facts.system.data))
     return {what + " is the current data set"};
   if (latest.same_path(*current)) return explain_current(facts.latest, *facts.system.data);
-  if (latest.name.ends_with('/'))
+  if (latest.name.ends_with('/')) {
     lines.push_back(string(latest_link) + " ends in a slash, which makes its name no version");
-  else if (latest.version == olm_version())
+  } else if (latest.version == olm_version()) {
     lines.push_back(what + " has a name that is no version");
+  }
   append(lines, explain_schema(what, facts.latest, *facts.system.data));
-  if (!(latest > *current))
+  if (!(latest > *current)) {
     lines.push_back(what + (*current > latest ? " is older than" : " is not newer than") +
                     " the current data set " + current->name);
+  }
   return lines;
 }
 
 sentences explain_start(const device_facts& facts) {
   const start_forecast& start = facts.start;
-  if (!start.status) return {start.endless + " makes a start wait, or run out of memory"};
+  if (!start.status) return {start.record.endless + " makes a start wait, or run out of memory"};
   sentences lines;
   const bool stops_at_latest = facts.latest.path.empty() && !facts.latest.problem.empty();
   if (facts.system.data && !stops_at_latest) {
-    if (has_bad_link(facts.current))
+    if (has_bad_link(facts.current)) {
       lines.push_back("the zoneinfo link leads to no data set: " + describe(start.zoneinfo.now));
-    else if (facts.current.data && !may_stay(*facts.current.data, *facts.system.data))
+    } else if (facts.current.data && !may_stay(*facts.current.data, *facts.system.data)) {
       lines = explain_current(facts.current, *facts.system.data);
+    }
   }
   append(lines, explain_latest(facts));
   return lines;
 }
 
 sentences list_remarks(const device_facts& facts) {
-  sentences lines = facts.start.obstacles;
+  sentences lines = facts.start.record.obstacles;
   if (facts.system.data) append(lines, remark_on_system(*facts.system.data));
   append(lines, remark_on_halves(facts.start));
   append(lines, remark_on_zone(facts.start));

@@ -21,12 +21,12 @@ dataset_facts gather_dataset(const std::function<std::string()>& find_path) {
   } catch (const std::out_of_range&) {
     facts.problem = "its version has a number beyond 32 bits";
   } catch (const std::runtime_error&) {
-    facts.problem = trial.endless + " does not end";
+    facts.problem = trial.get_record().endless + " does not end";
   } catch (int) {
     facts.problem = "its link leads to no data set";
   }
   trial.require_told();
-  facts.obstacles = trial.obstacles;
+  facts.obstacles = trial.get_record().obstacles;
   return facts;
 }
 
@@ -43,9 +43,10 @@ struct named_dataset {
 
 std::vector<update_facts> gather_updates(const device_facts& facts, const std::string& latest) {
   olm_trial trial;
-  trial.is_for_user = true;
+  trial.go_by_rights_of_user(true);
   if (!latest.empty()) trial.put_link(latest_link, latest);
-  const named_dataset current{facts.current.path, trial.find(zoneinfo_link, true).place};
+  const named_dataset current{get_parent(facts.start.zoneinfo.now.target),
+                              trial.find(zoneinfo_link, true).place};
   const named_dataset next{facts.latest.path, trial.find(latest_link, true).place};
   std::vector<update_facts> updates;
   for (const olm_entry& entry : trial.list(update_area)) {
@@ -65,6 +66,8 @@ std::vector<update_facts> gather_updates(const device_facts& facts, const std::s
 }
 
 }  // namespace
+
+std::string get_parent(const std::string& path) { return path.substr(0, path.rfind('/')); }
 
 const olm_icu& get_icu(const olm_dataset& data) {
   return dynamic_cast<const olm_icu&>(*data.components.back());

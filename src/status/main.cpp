@@ -63,7 +63,7 @@ struct answer {
 const char* get_verdict(const device_facts& facts, const string& update) {
   const string& target = facts.start.zoneinfo.next.target;
   if (facts.start.installs) return facts.latest.path == update ? "used" : "refused";
-  return target.substr(0, target.rfind('/')) == update ? "in-use" : "refused";
+  return get_parent(target) == update ? "in-use" : "refused";
 }
 
 int get_status(const start_forecast& start) {
@@ -83,9 +83,10 @@ answer find_answer(const question& asked) {
   if (asked.update.empty()) return answer;
   answer.verdict = get_verdict(answer.facts, asked.update);
   answer.status = answer.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
-  if (asked.had_slash)
+  if (asked.had_slash) {
     answer.reasons.emplace_back(
         "the target of tz_latest must not end in a slash, as this path did");
+  }
   return answer;
 }
 
@@ -117,7 +118,7 @@ void print_query(const answer& answer) {
   print_key("Next-Icutz", start.icutz.next.target);
   print_key("Next-Localtime", start.localtime.next.target);
   print_key("Next-Status", start.status ? std::to_string(*start.status) : "none");
-  print_keys("Next-Warning", start.warnings);
+  print_keys("Next-Warning", start.record.warnings);
   print_keys("Because", answer.because);
   print_keys("Remark", answer.remarks);
   for (const update_facts& update : facts.updates)
@@ -170,7 +171,7 @@ void print_report(const answer& answer) {
               clean(describe_start(facts)).c_str(),
               target.empty() ? "none" : clean(target).c_str());
   print_texts("because", answer.because);
-  print_texts("will warn", start.warnings);
+  print_texts("will warn", start.record.warnings);
   print_texts("remarks", answer.remarks);
   const char* label = "updates";
   for (const update_facts& update : facts.updates) {
@@ -183,16 +184,16 @@ void print_report(const answer& answer) {
 // --- What was asked ---
 
 [[noreturn]] void end(const string& text) {
-  std::fputs(text.c_str(), stdout);
+  static_cast<void>(std::fputs(text.c_str(), stdout));
   std::exit(std::fflush(stdout) == 0 ? EXIT_SUCCESS : cannot_be_told);
 }
 
 [[noreturn]] void refuse_usage() {
-  std::fputs(usage, stderr);
+  static_cast<void>(std::fputs(usage, stderr));
   std::exit(cannot_be_told);
 }
 
-question read_question(int count, char* arguments[]) {
+question read_question(int count, char** arguments) {
   const std::array<option, 5> options = {{{"query", no_argument, nullptr, 'q'},
                                           {"root", required_argument, nullptr, 'r'},
                                           {"help", no_argument, nullptr, 'h'},
@@ -215,7 +216,8 @@ question read_question(int count, char* arguments[]) {
         refuse_usage();
     }
   }
-  const std::span operands(arguments + optind, arguments + count);
+  const auto operands = std::span(arguments, static_cast<std::size_t>(count))
+                            .subspan(static_cast<std::size_t>(optind));
   if (operands.size() > 1) refuse_usage();
   if (operands.empty()) return asked;
   asked.update = operands.front();
