@@ -171,7 +171,7 @@ const std::vector<question> questions = {
            no_icu("2020b.1.0") + reason("icutz44l.dat is closed to others"),
            [] { chmod((third + "/icutz/icutz44l.dat").c_str(), 0640); }),
     refuse("2020b.1.0", update(third),
-           no_icu("2020b.1.0") + reason(third + " is closed to a start: user 0, mode 0"),
+           no_icu("2020b.1.0") + reason(third + " is closed to a start (owner: user 0, mode 0)"),
            [] { chmod(third.c_str(), 0); }),
     refuse("2147483648a", update(updates + "2147483648a"), reason("the latest update " + large)),
     {on_first,

@@ -39,7 +39,7 @@ std::string describe_rights(const olm_entry& entry) {
   std::array<char, sizeof "7777"> mode{};
   static_cast<void>(
       std::snprintf(mode.data(), mode.size(), "%o", entry.status.stx_mode & ALLPERMS));
-  return "user " + std::to_string(entry.status.stx_uid) + ", mode " + mode.data();
+  return " (owner: user " + std::to_string(entry.status.stx_uid) + ", mode " + mode.data() + ")";
 }
 
 // Takes the first name off a path, and the slashes before it; empty at the path's end.
@@ -135,7 +135,7 @@ bool olm_trial::may(const olm_entry& entry, unsigned rights) {
   if (has_list) leave_untold(entry.place + " has an access control list");
   const unsigned shift = is_roots ? 6 : entry.status.stx_gid == 0 ? 3 : 0;
   if ((entry.status.stx_mode >> shift & rights) == rights) return true;
-  note(get_path(entry.place) + (" is closed to a start: " + describe_rights(entry)));
+  note(get_path(entry.place) + (" is closed to a start" + describe_rights(entry)));
   return false;
 }
 
