@@ -174,6 +174,10 @@ const std::vector<question> questions = {
            no_icu("2020b.1.0") + reason(third + " is closed to a start (owner: user 0, mode 0)"),
            [] { chmod(third.c_str(), 0); }),
     refuse("2147483648a", update(updates + "2147483648a"), reason("the latest update " + large)),
+    {on_first + gone("/var/db/timezone"),
+     {"Verdict: refused", "Reason: a start cannot read that path from tz_latest"},
+     "exit 1",
+     first},
     {on_first,
      report{"Verdict: refused"} +
          reason("the latest update cannot be used: tz is not below " + updates),

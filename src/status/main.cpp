@@ -83,6 +83,9 @@ answer find_answer(const question& asked) {
   if (asked.update.empty()) return answer;
   answer.verdict = get_verdict(answer.facts, asked.update);
   answer.status = answer.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
+  if (answer.facts.latest.path != asked.update) {
+    answer.reasons = {"a start cannot read that path from tz_latest"};
+  }
   if (asked.had_slash) {
     answer.reasons.emplace_back(
         "the target of tz_latest must not end in a slash, as this path did");
@@ -183,9 +186,14 @@ void print_report(const answer& answer) {
 
 // --- What was asked ---
 
+void flush_output() {
+  if (std::fflush(stdout) != 0) err(cannot_be_told, "standard output");
+}
+
 [[noreturn]] void end(const string& text) {
   static_cast<void>(std::fputs(text.c_str(), stdout));
-  std::exit(std::fflush(stdout) == 0 ? EXIT_SUCCESS : cannot_be_told);
+  flush_output();
+  std::exit(EXIT_SUCCESS);
 }
 
 [[noreturn]] void refuse_usage() {
@@ -243,7 +251,7 @@ int main(int count, char* arguments[]) {
       print_text(answer.verdict.c_str(), asked.update);
       print_texts("", answer.reasons);
     }
-    if (std::fflush(stdout) != 0) err(cannot_be_told, "standard output");
+    flush_output();
     return answer.status;
   } catch (const std::exception& failure) {
     errx(cannot_be_told, "cannot be told: %s", clean(failure.what()).c_str());
