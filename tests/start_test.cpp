@@ -3,8 +3,11 @@
 #include <gtest/gtest.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <array>
 #include <cctype>
+#include <cstdio>
 
 #include "starts.h"
 
@@ -144,6 +147,9 @@ const std::vector<whole_start> starts = {
              fail_to_link(zoneinfo, system_zoneinfo),
      .changes = gone(legacy_icutz),
      .ends = "exit 1"},
+    {.name = "ICU data one level too deep",
+     .before = on_first + gone(second + "/icutz") + file(second + "/icutz/sub/icutz44l.dat", ""),
+     .says = no_schema(second) + refuse("2020a.10.0", "2020a.9.0")},
     {.name = "ICU data that can be read but not searched",
      .before = on_first,
      .says = no_schema(second) + refuse("2020a.10.0", "2020a.9.0"),
@@ -279,6 +285,31 @@ TEST(start, each_case) {
       EXPECT_EQ(forecasted, describe(heard));
       EXPECT_EQ(forecasted.front(),
                 "Next-Zoneinfo: " + (forecasted_target == "none" ? "" : forecasted_target));
+    }
+  }
+}
+
+// Where parts of a device are another user's, the start has only the rights of the unit.
+TEST(start, on_parts_of_another_user) {
+  constexpr uid_t another = 1000;
+  const std::array<std::pair<string, mode_t>, 8> closed = {{{second, 0700},
+                                                            {second, 0705},
+                                                            {second + "/icutz", 0744},
+                                                            {second + "/zoneinfo/+VERSION", 0600},
+                                                            {version, 0640},
+                                                            {"/var/db/timezone", 0755},
+                                                            {"/var/db/timezone", 0777},
+                                                            {"/var/db/timezone", 01777}}};
+  for (const auto& [path, mode] : closed) {
+    for (const gid_t group : {0U, another}) {
+      SCOPED_TRACE(path + " " + std::to_string(mode) + " " + std::to_string(group));
+      lay_out(on_first + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"));
+      ASSERT_EQ(chmod(path.c_str(), mode), 0);
+      // In a user namespace there may be no other users; that tests less, but holds as well.
+      if (chown(path.c_str(), another, group) != 0 || lchown(zoneinfo.c_str(), another, group) != 0)
+        std::puts("there are no other users here");
+      const report forecasted = forecast();
+      EXPECT_EQ(forecasted, describe(start()));
     }
   }
 }

@@ -3,6 +3,7 @@
 #include <sys/mount.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <array>
 #include <filesystem>
 
@@ -96,12 +97,13 @@ const std::vector<question> questions = {
     // System partitions
     {on_system + gone(version) + gone(schema),
      because("the update 2020a.10.0 has schema 44l; the system partition has schema none") +
-         remark("the system partition has no version: .1.0 is older than any update") +
+         remark("the system partition has no version that can be read: .1.0 counts as older than "
+                "every update") +
          remark("the system partition has no schema: only an update without ICU data fits"),
      "exit 0"},
     {on_system + file(schema, "44L"),
      because("the update 2020a.10.0 has schema 44l; the system partition has schema 44L") +
-         remark("the system partition's schema is none, so no update fits: 44L"),
+         remark("44L is no schema, so no update fits the system partition"),
      "exit 0"},
     {on_system + file(version, "9999999999a"), because("the system partition " + large)},
     {on_second + file(version, "2020b"),
@@ -111,7 +113,7 @@ const std::vector<question> questions = {
     {on_first + link_to(latest, "tz/2020a.10.0"),
      because("the latest update cannot be used: tz/2020a.10.0 is not below " + updates)},
     {on_system + file(latest, ""),
-     because("the latest update cannot be used: its link leads to no data set"), "exit 0"},
+     because("the latest update cannot be used: its link cannot be read"), "exit 0"},
     {on_first + link_to(latest, second + "/"),
      because(latest + " ends in a slash, which makes its name no version") +
          because("the update 2020a.10.0/ is older than the current data set 2020a.9.0"),
@@ -122,16 +124,22 @@ const std::vector<question> questions = {
     {on_first + link_to(zoneinfo, updates + "2147483648a/zoneinfo"),
      because("the current data set " + large) + mended},
     {on_first + folder(zoneinfo),
-     because("the zoneinfo link leads to no data set: a directory") + because(newer + "2019c.1.0") +
-         remark("a directory is in the place of " + zoneinfo) + no_zone("/Asia/Tokyo")},
+     because("a directory is in the place of " + zoneinfo) +
+         because("the zoneinfo link leads to no data set: a directory") +
+         because(newer + "2019c.1.0") + no_zone("/Asia/Tokyo")},
     {on_system + gone("/var/db/timezone"),
-     because("the zoneinfo link leads to no data set: none") +
-         because("there is no latest update") + remark("there is no directory for " + zoneinfo) +
-         remark("after the next start, there is no local-time link")},
+     because("there is no directory for " + zoneinfo) + because("there is no zoneinfo link") +
+         because("there is no latest update") +
+         remark("after the next start, the local-time link is missing")},
+    {on_second + gone(zone) + file(zone + "/kept", ""),
+     because("a directory is in the place of " + zone) + in_use +
+         remark("after the next start, the local-time link is a directory")},
+    {on_second + folder(second + "/zoneinfo/Asia/Tokio") + link_to(zone, zoneinfo + "/Asia/Tokio"),
+     in_use + no_zone("/Asia/Tokio"), "exit 0"},
     {on_second + gone(icutz), in_use + apart(second + "/zoneinfo", "a file"), "exit 0", "",
      [] { mkfifo(icutz.c_str(), 0644); }},
     {on_first + folder("/var/db/icu") + folder(marker),
-     waiting + remark(icutz + " cannot be removed") + apart(system_zoneinfo, "a file"), "exit 1",
+     because(icutz + " cannot be removed") + waiting + apart(system_zoneinfo, "a file"), "exit 1",
      "",
      [] {
        std::filesystem::remove(icutz);
@@ -175,13 +183,23 @@ const std::vector<question> questions = {
            [] { chmod(third.c_str(), 0); }),
     refuse("2147483648a", update(updates + "2147483648a"), reason("the latest update " + large)),
     {on_first + gone("/var/db/timezone"),
-     {"Verdict: refused", "Reason: a start cannot read that path from tz_latest"},
+     {"Verdict: refused", "Reason: there is no directory for " + zoneinfo,
+      "Reason: a start cannot read that path from tz_latest"},
      "exit 1",
      first},
     {on_first,
      report{"Verdict: refused"} +
          reason("the latest update cannot be used: tz is not below " + updates),
      "exit 1", "tz"},
+    {on_system,
+     report{"Verdict: refused"} +
+         reason("the latest update cannot be used: /usr/share is not below " + updates),
+     "exit 1", "/usr/share"},
+    {on_first,
+     report{"Verdict: refused"} + reason(record + " makes a start wait, or run out of memory"),
+     "exit 1", second, [] { mkfifo(record.c_str(), 0644); }},
+    {on_first, report{"Verdict: refused"} + reason("a start cannot read that path from tz_latest"),
+     "exit 1", second + string(1024, '0')},
 };
 
 TEST(status, says_why) {
@@ -206,9 +224,9 @@ TEST(status, says_why) {
 TEST(status, reports_to_people) {
   const string refused = updates + "2020c.1.0";
   lay_out(on_second + link_to(latest, refused) + folder(refused) + file(version, "2020b\x1b") +
-          link_to(updates + "part", "nowhere"));
+          link_to(updates + "part", "nowhere") + link_to("/usr/share/localtime", zone));
   ASSERT_EQ(mount("tmpfs", "/etc", "tmpfs", 0, nullptr), 0);
-  std::filesystem::create_symlink("../" + zone, "/etc/localtime");
+  std::filesystem::create_symlink("../usr/share/localtime", "/etc/localtime");
   EXPECT_EQ(
       ask({}),
       (report{"system      2020b?.1.0, schema 44l",
@@ -225,8 +243,8 @@ TEST(status, reports_to_people) {
               "            Cannot parse version string 2020b?.1.0",
               "            No ICU schema found for /var/db/timezone/tz/2020c.1.0",
               "            New update not compatible or older version: 2020c.1.0 vs. 2020a.10.0",
-              "remarks     the system partition has no version: 2020b?.1.0 is older than any",
-              "            update",
+              "remarks     the system partition has no version that can be read: 2020b?.1.0",
+              "            counts as older than every update",
               "updates     2020a.9.0 unused",
               "            2020a.10.0 current",
               "            2020c.1.0 refused: the update 2020c.1.0 has no ICU data file that",
@@ -234,9 +252,42 @@ TEST(status, reports_to_people) {
               "exit 0"}));
   EXPECT_EQ(ask({refused}).front(), "refused     " + refused);
   EXPECT_EQ(ask({"--root=" + first}).at(6), "next start  fails: none");
+  std::filesystem::rename("/etc/localtime", "/etc/moved");
+  EXPECT_EQ(ask({"--query"}).at(20),
+            "Remark: /etc/localtime does not lead through the local-time link: none");
   // Wherever a name of one word ends.
   lay_out(on_first + link_to(latest, updates + string(100, 'x')));
   EXPECT_EQ(ask({}).at(9), "            " + updates + string(100, 'x'));
+}
+
+TEST(status, answers_scripts) {
+  lay_out(on_second + gone(latest) + gone(second + "/icutz") + gone(icutz) +
+          link_to(second + "/icutz", first + "/icutz") + link_to(legacy_icutz, "/usr/share/icu") +
+          link_to(updates + "2018a", "2020a.10.0") + update(updates + "2020a.1"));
+  report lines = ask({"--query"});
+  lines.erase(std::find_if(lines.begin(), lines.end(), [](const string& line) {
+    return line.starts_with("Remark: /etc/localtime");
+  }));
+  EXPECT_EQ(lines, (report{"Zoneinfo: " + second + "/zoneinfo",
+                           "Icutz: ",
+                           "Localtime: " + zoneinfo + "/Asia/Tokyo",
+                           "System-Version: 2019c.1.0",
+                           "System-Schema: 44l",
+                           "Current-Version: 2020a.10.0",
+                           "Current-Schema: 44l",
+                           "Latest-Version: ",
+                           "Latest-Schema: ",
+                           "Next-Zoneinfo: " + second + "/zoneinfo",
+                           "Next-Icutz: /usr/share/icu",
+                           "Next-Localtime: " + zoneinfo + "/Asia/Tokyo",
+                           "Next-Status: 0",
+                           "Because: there is no latest update",
+                           apart(second + "/zoneinfo", "/usr/share/icu").front(),
+                           "Update: 2018a current",
+                           "Update: 2020a.1 unused",
+                           "Update: 2020a.9.0 current",
+                           "Update: 2020a.10.0 current",
+                           "exit 1"}));
 }
 
 TEST(status, is_asked_wrongly_or_cannot_tell) {

@@ -6,7 +6,6 @@
 #include <cstring>
 #include <regex>
 
-#include "dataset/first_word.h"
 #include "dataset/pattern.h"
 #include "fs/device.h"
 #include "fs/file_operations.h"
@@ -43,13 +42,13 @@ olm_icu::olm_icu() : olm_icu(std::string()) {}
 
 olm_icu::olm_icu(const std::string& path)
     : olm_dataset_component(path),
-      directory(path.empty() ? system_icu_directory : path + "/icutz") {
+      directory(path.empty() ? system_icu_directory : path + update_icu_directory) {
   initialize();
 }
 
 void olm_icu::initialize() {
   if (dataset_path.empty()) {
-    schema = read_first_word(directory + schema_file);
+    schema = device::read_first_word(directory + schema_file);
     return;
   }
   schema = find_schema(directory);

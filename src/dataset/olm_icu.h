@@ -19,6 +19,9 @@ inline constexpr const char* schema_file = "/icutzformat.txt";
 // Prints nothing.
 [[nodiscard]] std::string read_schema(const char* name);
 
+// Where an update keeps its ICU data.
+inline constexpr const char* update_icu_directory = "/icutz";
+
 // Whether `text` has the form of a schema. Prints nothing.
 [[nodiscard]] bool is_schema(const std::string& text);
 

@@ -1,6 +1,5 @@
 #include "dataset/olm_zoneinfo.h"
 
-#include "dataset/first_word.h"
 #include "fs/device.h"
 #include "fs/file_operations.h"
 
@@ -8,11 +7,13 @@ olm_zoneinfo::olm_zoneinfo() : olm_zoneinfo(std::string()) {}
 
 olm_zoneinfo::olm_zoneinfo(const std::string& path)
     : olm_dataset_component(path),
-      directory(path.empty() ? system_zoneinfo_directory : path + "/zoneinfo") {
+      directory(path.empty() ? system_zoneinfo_directory : path + update_zoneinfo_directory) {
   read_version();
 }
 
-void olm_zoneinfo::read_version() { version_text = read_first_word(directory + version_file); }
+void olm_zoneinfo::read_version() {
+  version_text = device::read_first_word(directory + version_file);
+}
 
 std::string olm_zoneinfo::get_version_text() const { return version_text; }
 

@@ -10,6 +10,9 @@ inline constexpr const char* zoneinfo_link = "/var/db/timezone/zoneinfo";
 // Where the system partition keeps its zone files.
 inline constexpr const char* system_zoneinfo_directory = "/usr/share/zoneinfo.default";
 
+// Where an update keeps its zone files.
+inline constexpr const char* update_zoneinfo_directory = "/zoneinfo";
+
 // The file among the zone files that holds their version.
 inline constexpr const char* version_file = "/+VERSION";
 

@@ -10,26 +10,26 @@
 #include <algorithm>
 #include <array>
 #include <climits>
+#include <cstdio>
 #include <filesystem>
-#include <fstream>
-#include <iomanip>
 #include <memory>
 #include <stdexcept>
 #include <system_error>
 #include <utility>
 
+#include "fs/olm_descriptor.h"
+
 namespace {
 
 constexpr int most_links = 40;  // that the kernel follows on the way to one entry
 
-// With a version of this length, a start needs more than the 64 MB that the unit allows it.
-constexpr int longest_word = 8 << 20;
+// With a version that is somewhat longer, a start needs more than the 64 MB that the unit allows
+// it.
+constexpr std::size_t longest_word = 4 << 20;
+
+constexpr const char* white_space = " \t\n\v\f\r";
 
 const char* get_path(const std::string& place) { return place.empty() ? "/" : place.c_str(); }
-
-std::string get_parent(const std::string& place) {
-  return place.substr(0, place.empty() ? 0 : place.rfind('/'));
-}
 
 bool has_attribute(const olm_entry& entry, unsigned attributes) {
   return (entry.status.stx_attributes & attributes) != 0;
@@ -56,27 +56,28 @@ struct directory_closer {
 
 }  // namespace
 
+std::string get_parent(const std::string& path) { return path.substr(0, path.rfind('/')); }
+
 bool olm_entry::equals(const olm_entry& other) const {
   constexpr unsigned kind = S_IFMT;
   return (status.stx_mode & kind) == (other.status.stx_mode & kind) && target == other.target;
 }
 
-olm_trial*& olm_trial::get_innermost() {
+olm_trial*& olm_trial::get_current() {
   // NOLINTNEXTLINE(cppcoreguidelines-avoid-non-const-global-variables): for functions of the C kind
-  static olm_trial* innermost = nullptr;
-  return innermost;
+  static olm_trial* current = nullptr;
+  return current;
 }
 
-olm_trial::olm_trial() : outer_(std::exchange(get_innermost(), this)) {}
+olm_trial::olm_trial() { get_current() = this; }
 
-olm_trial::~olm_trial() { get_innermost() = outer_; }
+olm_trial::~olm_trial() { get_current() = nullptr; }
 
 olm_trial& olm_trial::get() {
-  olm_trial& innermost = *get_innermost();
-  innermost.require_told();
-  if (const std::string& end = innermost.record_.endless; !end.empty())
-    throw std::runtime_error(end);
-  return innermost;
+  olm_trial& current = *get_current();
+  current.require_told();
+  if (const std::string& end = current.record_.endless; !end.empty()) throw std::runtime_error(end);
+  return current;
 }
 
 void olm_trial::require_told() const {
@@ -88,7 +89,7 @@ void olm_trial::leave_untold(const std::string& why) {
   throw std::runtime_error(why);
 }
 
-void olm_trial::end(const std::string& place) {
+void olm_trial::end_at(const std::string& place) {
   record_.endless = place;
   throw std::runtime_error(place);
 }
@@ -100,6 +101,7 @@ void olm_trial::note(const std::string& obstacle) {
 
 // What stands at `place`.
 olm_entry olm_trial::look_up(const std::string& place) {
+  if (place.size() >= PATH_MAX) leave_untold("a path is too long: " + place);
   const auto changed = changes_.find(place);
   if (changed != changes_.end()) return changed->second;
   olm_entry entry{.error = 0, .place = place};
@@ -135,12 +137,13 @@ bool olm_trial::may(const olm_entry& entry, unsigned rights) {
   if (has_list) leave_untold(entry.place + " has an access control list");
   const unsigned shift = is_roots ? 6 : entry.status.stx_gid == 0 ? 3 : 0;
   if ((entry.status.stx_mode >> shift & rights) == rights) return true;
-  note(get_path(entry.place) + (" is closed to a start" + describe_rights(entry)));
+  const std::string place = get_path(entry.place);
+  note((rights & change) != 0 ? "nothing can be changed in " + place + describe_rights(entry)
+                              : place + " is closed to a start" + describe_rights(entry));
   return false;
 }
 
 olm_entry olm_trial::find(const std::string& path, bool follows) {
-  if (path.size() >= PATH_MAX) return {.error = ENAMETOOLONG};
   std::string rest = path;
   olm_entry at = look_up("");
   for (int links = 0;;) {
@@ -202,9 +205,10 @@ int olm_trial::refuse_making(const olm_entry& entry) {
   if (entry.error != ENOENT) return entry.error;
   if (const int error = refuse_writing(entry); error != 0) return error;
   const olm_entry directory = look_up_directory(entry);
-  const bool allowed =
-      may(directory, change | search) && !has_attribute(directory, STATX_ATTR_IMMUTABLE);
-  return allowed ? 0 : EACCES;
+  if (!may(directory, change | search)) return EACCES;
+  if (!has_attribute(directory, STATX_ATTR_IMMUTABLE)) return 0;
+  note("nothing can be made in " + directory.place);
+  return EPERM;
 }
 
 int olm_trial::refuse_removing(const olm_entry& entry) {
@@ -251,8 +255,9 @@ int olm_trial::remove(const std::string& path) {
 
 int olm_trial::symlink(const std::string& target, const std::string& path) {
   const olm_entry entry = find(path);
-  const int error = target.size() < PATH_MAX ? refuse_making(entry) : ENAMETOOLONG;
-  if (entry.place.empty()) note("there is no directory for " + path);
+  const int error = refuse_making(entry);
+  if (error == ENOENT || error == ENOTDIR) note("there is no directory for " + path);
+  if (entry.is(S_IFDIR)) note("a directory is in the place of " + path);
   if (error == 0) put(entry.place, S_IFLNK, target);
   return error;
 }
@@ -268,27 +273,41 @@ int olm_trial::write(const std::string& path, bool reads_too) {
   if (entry.is(S_IFDIR)) return EISDIR;
   if (entry.is(S_IFSOCK)) return ENXIO;
   if (!may(entry, reads_too ? look_into | change : change)) return EACCES;
-  if (entry.is(S_IFIFO) && !reads_too) end(entry.place);
+  if (entry.is(S_IFIFO) && !reads_too) end_at(entry.place);
   if (has_attribute(entry, STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND)) return EPERM;
   return entry.is(S_IFREG) ? refuse_writing(entry) : 0;
 }
 
-// Whether the first word in the file at `place` ends before memory does.
-bool olm_trial::has_end(const std::string& place) {
-  std::ifstream file(place);
+// The first word in the regular file at `place`, read in a way that never waits.
+std::string olm_trial::read_word_in(const std::string& place) {
+  const olm_descriptor file(open(place.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
   if (!file.is_open() && errno == EACCES) leave_untold("you may not read " + place);
-  std::string word;
-  file >> std::setw(longest_word) >> word;
-  return word.size() < longest_word;
+  struct stat status {};
+  // Another has a lease on it, or has put something else there by now.
+  if ((!file.is_open() && errno == EAGAIN) ||
+      (fstat(file.get(), &status) == 0 && !S_ISREG(status.st_mode)))
+    end_at(place);
+  std::array<char, BUFSIZ> part{};
+  std::string text;
+  for (ssize_t length = 0; (length = read(file.get(), part.data(), part.size())) > 0;) {
+    text.append(part.data(), static_cast<std::size_t>(length));
+    text.erase(0, text.find_first_not_of(white_space));
+    const std::size_t end = text.find_first_of(white_space);
+    if (end != std::string::npos) return text.substr(0, end);
+    if (text.size() >= longest_word) end_at(place);
+  }
+  return text;
 }
 
-std::string olm_trial::find_readable(const std::string& path) {
+std::string olm_trial::read_first_word(const std::string& path) {
   const olm_entry entry = find(path, true);
   if (entry.error != 0 || entry.is(S_IFDIR) || entry.is(S_IFSOCK) || !may(entry, look_into))
     return {};
   const bool is_null =
       entry.is(S_IFCHR) && entry.status.stx_rdev_major == 1 && entry.status.stx_rdev_minor == 3;
-  if (is_null) return {};
-  if (!entry.is(S_IFREG) || !has_end(entry.place)) end(entry.place);
-  return entry.place;
+  // The system's own files have no size. Reading some of them waits, or uses up what they tell.
+  const bool is_empty = entry.is(S_IFREG) && entry.status.stx_size == 0;
+  if (is_null || is_empty) return {};
+  if (!entry.is(S_IFREG)) end_at(entry.place);
+  return read_word_in(entry.place);
 }

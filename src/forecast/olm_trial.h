@@ -7,6 +7,9 @@
 #include <string>
 #include <vector>
 
+// What stands before the last slash in `path`.
+[[nodiscard]] std::string get_parent(const std::string& path);
+
 // What stands at a path.
 struct olm_entry {
   int error = ENOENT;    // 0, or the errno with which the system fails to find it
@@ -18,6 +21,9 @@ struct olm_entry {
   [[nodiscard]] bool is(mode_t type) const {
     return error == 0 && (status.stx_mode & S_IFMT) == type;
   }
+  // The last name in `place`.
+  [[nodiscard]] std::string get_name() const { return place.substr(place.rfind('/') + 1); }
+
   // Whether both are of one kind, and hold the same if they are links.
   [[nodiscard]] bool equals(const olm_entry& other) const;
 };
@@ -40,7 +46,8 @@ struct trial_record {
 // thrown, with that as its text. As a start goes on after whatever is thrown, each further use of
 // fs/device.h throws it again, so that nothing counts that comes later.
 //
-// Nothing here prints. What may look at the device throws as told above, and in no other way.
+// There is one trial at a time. Nothing here prints. What may look at the device throws as told
+// above, and in no other way but for want of memory.
 class olm_trial {
  public:
   olm_trial();
@@ -72,8 +79,7 @@ class olm_trial {
   [[nodiscard]] int remove(const std::string& path);
   [[nodiscard]] int symlink(const std::string& target, const std::string& path);
   [[nodiscard]] int write(const std::string& path, bool reads_too);
-  // The path to open for reading `path`; empty where a start finds nothing to read.
-  [[nodiscard]] std::string find_readable(const std::string& path);
+  [[nodiscard]] std::string read_first_word(const std::string& path);
   void warn(const std::string& message) { record_.warnings.push_back(message); }
 
  private:
@@ -87,17 +93,16 @@ class olm_trial {
   [[nodiscard]] int refuse_writing(const olm_entry& entry);
   [[nodiscard]] int refuse_making(const olm_entry& entry);
   [[nodiscard]] int refuse_removing(const olm_entry& entry);
-  [[nodiscard]] bool has_end(const std::string& place);
+  [[nodiscard]] std::string read_word_in(const std::string& place);
   void note(const std::string& obstacle);
   void put(const std::string& place, mode_t type, const std::string& target);
   [[noreturn]] void leave_untold(const std::string& why);
-  [[noreturn]] void end(const std::string& place);
+  [[noreturn]] void end_at(const std::string& place);
 
-  [[nodiscard]] static olm_trial*& get_innermost();
+  [[nodiscard]] static olm_trial*& get_current();
 
   trial_record record_;
   std::map<std::string, olm_entry> changes_;  // by their places
   std::string untold_;
   bool is_for_user_ = false;
-  olm_trial* outer_;
 };

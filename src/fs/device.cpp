@@ -49,7 +49,12 @@ int create_file(const char* path, int protection_class, mode_t mode) {
   return open_dprotected_np(path, O_CREAT | O_RDWR, protection_class, 0, mode);
 }
 
-std::ifstream open_to_read(const std::string& path) { return std::ifstream(path); }
+std::string read_first_word(const std::string& path) {
+  std::string word;
+  std::ifstream file(path);
+  file >> word;
+  return word;
+}
 
 std::ofstream open_to_write(const std::string& path) { return std::ofstream(path); }
 

@@ -2,8 +2,10 @@
 // above this header reaches the device in another way. Each call does what the system's own call of
 // that name does: -1, with errno set, stands for a failure.
 //
-// There are two implementations, and a program is linked with one of them: fs/device.cpp makes the
-// calls, forecast/olm_trial.cpp looks at the device but only remembers what is to be changed.
+// There are two implementations, and a program is linked with one of them. fs/device.cpp makes the
+// calls; they throw nothing but for want of memory. forecast/trial_device.cpp looks at the device
+// but only remembers what is to be changed; there every call may throw std::runtime_error, and so
+// may whatever makes it.
 #pragma once
 
 #include <sys/types.h>
@@ -31,8 +33,12 @@ void set_protection_class(const char* directory, int protection_class);
 // an existing one stays as it is. Gives a descriptor that the caller owns.
 [[nodiscard]] int create_file(const char* path, int protection_class, mode_t mode);
 
-// Streams that are not open where the file cannot be opened. The one to write empties the file.
-[[nodiscard]] std::ifstream open_to_read(const std::string& path);
+// The first word of the file `path`: white space is skipped, then bytes are taken up to the next
+// white space (that of the "C" locale) or the end, however many they are. Empty when the file
+// cannot be opened or holds no word. Where memory runs out or reading fails, the word ends there.
+[[nodiscard]] std::string read_first_word(const std::string& path);
+
+// A stream to the file `path`, which it empties or makes; it is not open where that fails.
 [[nodiscard]] std::ofstream open_to_write(const std::string& path);
 
 // Takes the name and the mode of a file; true to see no more of them.

@@ -12,6 +12,10 @@ namespace {
 using std::string;
 
 constexpr const char* system_localtime = "/etc/localtime";
+constexpr int longest_chain = 40;  // of links
+
+// Below which the unit may write.
+constexpr const char* state_directory = "/var/db";
 
 // Leaves out what has been said.
 void append(sentences& lines, const sentences& more) {
@@ -38,19 +42,17 @@ sentences explain_problem(const string& what, const dataset_facts& facts) {
   return lines;
 }
 
-const olm_zoneinfo& get_zoneinfo(const olm_dataset& data) {
-  return dynamic_cast<const olm_zoneinfo&>(*data.components.front());
-}
-
 // Why no file counts as the ICU data of an update.
 sentences explain_missing_schema(const dataset_facts& update) {
   olm_trial trial;
   if (!update.obstacles.empty()) return update.obstacles;
-  const string& directory = get_icu(*update.data).directory;
-  if (!trial.find(directory, true).is(S_IFDIR)) return {"there is no directory " + directory};
+  const string directory = update.path + update_icu_directory;
+  for (const string& needed : {update.path, directory}) {
+    if (!trial.find(needed, true).is(S_IFDIR)) return {"there is no directory " + needed};
+  }
   sentences lines;
   for (const olm_entry& entry : trial.list(directory)) {
-    const string name = entry.place.substr(entry.place.rfind('/') + 1);
+    const string name = entry.get_name();
     if (read_schema(name.c_str()).empty()) continue;
     const char* const fault = entry.is(S_IFLNK)   ? " is a symbolic link"
                               : entry.is(S_IFREG) ? " is closed to others"
@@ -64,10 +66,10 @@ sentences explain_missing_schema(const dataset_facts& update) {
 sentences explain_schema(const string& what, const dataset_facts& facts,
                          const olm_dataset& system) {
   if (facts.data->compatible_with(system)) return {};
-  const string& schema = get_icu(*facts.data).schema;
+  const string& schema = get_schema(*facts.data);
   const string has = schema.empty() ? " has no ICU data file that counts" : " has schema " + schema;
   sentences lines = {what + has + "; the system partition has schema " +
-                     or_none(get_icu(system).schema)};
+                     or_none(get_schema(system))};
   if (schema.empty()) append(lines, explain_missing_schema(facts));
   return lines;
 }
@@ -80,13 +82,38 @@ sentences explain_current(const dataset_facts& current, const olm_dataset& syste
   return lines;
 }
 
+// Why the latest update does not take over from `current`.
+sentences explain_refusal(const device_facts& facts, const olm_dataset& current) {
+  const olm_dataset& latest = *facts.latest.data;
+  const olm_dataset& system = *facts.system.data;
+  const string what = "the update " + latest.name;
+  const int error = olm_trial().find(latest.path, true).error;
+  if (error == ENOENT || error == ENOTDIR) return {"there is no directory " + latest.path};
+  if (latest.same_path(current)) {
+    if (may_stay(current, system)) return {what + " is the current data set"};
+    return explain_current(facts.latest, system);
+  }
+  sentences lines;
+  if (latest.name.ends_with('/')) {
+    lines.push_back(string(latest_link) + " ends in a slash, which makes its name no version");
+  } else if (latest.version == olm_version()) {
+    lines.push_back(what + " has a name that is no version");
+  }
+  append(lines, explain_schema(what, facts.latest, system));
+  if (!(latest > current)) {
+    lines.push_back(what + (current > latest ? " is older than" : " is not newer than") +
+                    " the current data set " + current.name);
+  }
+  return lines;
+}
+
 // --- Links ---
 
 // Where the ICU link belongs while the zoneinfo link is like this: nowhere with the system
 // partition's zone files.
 string get_own_icutz(const olm_entry& zoneinfo) {
-  return zoneinfo.target.starts_with(update_area) ? olm_icu(get_parent(zoneinfo.target)).directory
-                                                  : "";
+  const bool is_in_update = zoneinfo.target.starts_with(update_area);
+  return is_in_update ? get_parent(zoneinfo.target) + update_icu_directory : "";
 }
 
 bool are_apart(const olm_entry& zoneinfo, const olm_entry& icutz) {
@@ -94,7 +121,6 @@ bool are_apart(const olm_entry& zoneinfo, const olm_entry& icutz) {
 }
 
 sentences remark_on_halves(const start_forecast& start) {
-  olm_trial trial;
   if (!start.zoneinfo.next.is(S_IFLNK)) return {};
   if (are_apart(start.zoneinfo.next, start.icutz.next)) {
     return {"after the next start, the zone files and the ICU data do not belong together: " +
@@ -110,7 +136,10 @@ sentences remark_on_halves(const start_forecast& start) {
 sentences remark_on_zone(const start_forecast& start) {
   const string before = start.localtime.now.error == 0 ? describe(start.localtime.now) : "missing";
   const string after = describe(start.localtime.next);
-  if (start.localtime.next.error != 0) return {"after the next start, there is no local-time link"};
+  if (!start.localtime.next.is(S_IFLNK)) {
+    const bool is_missing = start.localtime.next.error != 0;
+    return {"after the next start, the local-time link is " + (is_missing ? "missing" : after)};
+  }
   sentences lines;
   if (!start.localtime.now.equals(start.localtime.next)) {
     lines.push_back("the local-time link is " + before + "; the next start makes it lead to " +
@@ -124,25 +153,39 @@ sentences remark_on_zone(const start_forecast& start) {
 }
 
 sentences remark_on_system_localtime() {
-  namespace paths = std::filesystem;
-  const olm_entry entry = olm_trial().find(system_localtime);
-  const paths::path target = paths::path(system_localtime).parent_path() / entry.target;
-  if (target.lexically_normal() == localtime_link) return {};
+  olm_trial trial;
+  std::filesystem::path path = system_localtime;
+  olm_entry entry = trial.find(path);
+  const olm_entry first = entry;
+  for (int links = 0; links < longest_chain && entry.is(S_IFLNK); ++links) {
+    path = (path.parent_path() / entry.target).lexically_normal();
+    if (path == localtime_link) return {};
+    entry = trial.find(path);
+  }
   return {string(system_localtime) +
-          " does not lead through the local-time link: " + describe(entry)};
+          " does not lead through the local-time link: " + describe(first)};
+}
+
+// Whether the unit's sandbox lets a start write where the links are.
+sentences remark_on_sandbox() {
+  olm_trial trial;
+  const string links = trial.find(get_parent(zoneinfo_link), true).place;
+  if (links.empty() || links.starts_with(trial.find(state_directory, true).place + '/')) return {};
+  return {"the unit lets a start write below " + string(state_directory) +
+          " alone, but the links are in " + links};
 }
 
 sentences remark_on_system(const olm_dataset& system) {
   sentences lines;
-  const string& schema = get_icu(system).schema;
+  const string& schema = get_schema(system);
   if (system.version == olm_version()) {
-    lines.push_back("the system partition has no version: " + system.name +
-                    " is older than any update");
+    lines.push_back("the system partition has no version that can be read: " + system.name +
+                    " counts as older than every update");
   }
   if (schema.empty()) {
     lines.emplace_back("the system partition has no schema: only an update without ICU data fits");
   } else if (!is_schema(schema)) {
-    lines.push_back("the system partition's schema is none, so no update fits: " + schema);
+    lines.push_back(schema + " is no schema, so no update fits the system partition");
   }
   return lines;
 }
@@ -166,51 +209,40 @@ string describe_start(const device_facts& facts) {
 }
 
 sentences explain_latest(const device_facts& facts) {
+  const start_forecast& start = facts.start;
+  const olm_dataset* const current = find_weighed(facts);
+  if (!start.status) return {start.record.endless + " makes a start wait, or run out of memory"};
   if (!facts.system.data) return explain_problem("the system partition", facts.system);
   if (facts.latest.path.empty() && facts.latest.problem.empty())
     return {"there is no latest update"};
   if (!facts.latest.data) return explain_problem("the latest update", facts.latest);
-  const olm_dataset* const current = find_weighed(facts);
   if (current == nullptr) return explain_problem("the current data set", facts.current);
-
   const olm_dataset& latest = *facts.latest.data;
-  const string what = "the update " + latest.name;
+  if (!takes_over(latest, *current, *facts.system.data)) return explain_refusal(facts, *current);
+
+  // If it does not, what it met tells why.
   sentences lines;
-  if (takes_over(latest, *current, *facts.system.data)) {
-    lines = {what + " is fit, and newer than the current data set " + current->name};
-    const string file = get_zoneinfo(latest).directory + version_file;
-    if (olm_trial().find(file, true).error == ENOENT)
-      lines.push_back("it has no " + file + ", which a start does not ask for");
-    return lines;
-  }
-  const int error = olm_trial().find(latest.path, true).error;
-  if (error == ENOENT || error == ENOTDIR) return {"there is no directory " + latest.path};
-  if (latest.same_path(*current) && may_stay(*current, *facts.system.data))
-    return {what + " is the current data set"};
-  if (latest.same_path(*current)) return explain_current(facts.latest, *facts.system.data);
-  if (latest.name.ends_with('/')) {
-    lines.push_back(string(latest_link) + " ends in a slash, which makes its name no version");
-  } else if (latest.version == olm_version()) {
-    lines.push_back(what + " has a name that is no version");
-  }
-  append(lines, explain_schema(what, facts.latest, *facts.system.data));
-  if (!(latest > *current)) {
-    lines.push_back(what + (*current > latest ? " is older than" : " is not newer than") +
-                    " the current data set " + current->name);
-  }
+  if (!start.installs) lines = start.record.obstacles;
+  lines.push_back("the update " + latest.name + " is fit, and newer than the current data set " +
+                  current->name);
+  const string file = latest.path + update_zoneinfo_directory + version_file;
+  if (olm_trial().find(file, true).error == ENOENT)
+    lines.push_back("it has no " + file + ", which a start does not ask for");
   return lines;
 }
 
 sentences explain_start(const device_facts& facts) {
   const start_forecast& start = facts.start;
-  if (!start.status) return {start.record.endless + " makes a start wait, or run out of memory"};
   sentences lines;
+  if (start.status == EXIT_FAILURE) lines = start.record.obstacles;
   const bool stops_at_latest = facts.latest.path.empty() && !facts.latest.problem.empty();
-  if (facts.system.data && !stops_at_latest) {
-    if (has_bad_link(facts.current)) {
+  if (start.status && facts.system.data && !stops_at_latest) {
+    if (start.zoneinfo.now.error == ENOENT) {
+      lines.emplace_back("there is no zoneinfo link");
+    } else if (has_bad_link(facts.current)) {
       lines.push_back("the zoneinfo link leads to no data set: " + describe(start.zoneinfo.now));
     } else if (facts.current.data && !may_stay(*facts.current.data, *facts.system.data)) {
-      lines = explain_current(facts.current, *facts.system.data);
+      append(lines, explain_current(facts.current, *facts.system.data));
     }
   }
   append(lines, explain_latest(facts));
@@ -218,10 +250,15 @@ sentences explain_start(const device_facts& facts) {
 }
 
 sentences list_remarks(const device_facts& facts) {
-  sentences lines = facts.start.record.obstacles;
+  sentences lines;
+  const sentences said = explain_start(facts);
+  for (const string& obstacle : facts.start.record.obstacles) {
+    if (std::find(said.begin(), said.end(), obstacle) == said.end()) lines.push_back(obstacle);
+  }
   if (facts.system.data) append(lines, remark_on_system(*facts.system.data));
   append(lines, remark_on_halves(facts.start));
   append(lines, remark_on_zone(facts.start));
   append(lines, remark_on_system_localtime());
+  append(lines, remark_on_sandbox());
   return lines;
 }

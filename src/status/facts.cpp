@@ -22,42 +22,49 @@ dataset_facts gather_dataset(const std::function<std::string()>& find_path) {
     facts.problem = "its version has a number beyond 32 bits";
   } catch (const std::runtime_error&) {
     facts.problem = trial.get_record().endless + " does not end";
-  } catch (int) {
-    facts.problem = "its link leads to no data set";
+  } catch (int error) {
+    facts.problem = error == -1 ? "its link leads to no data set" : "its link cannot be read";
   }
   trial.require_told();
   facts.obstacles = trial.get_record().obstacles;
   return facts;
 }
 
-// A data set that a link names: by the path that a start reads from it, or by where it really
-// leads.
-struct named_dataset {
-  std::string path;
-  std::string place;
-
-  [[nodiscard]] bool is(const std::string& other_path, const olm_entry& directory) const {
-    return path == other_path || (place + '/').starts_with(directory.place + '/');
-  }
-};
+// Where the links, or the parts of a data set, really are.
+std::vector<std::string> find_places(olm_trial& trial, const std::vector<std::string>& paths) {
+  std::vector<std::string> places(paths.size());
+  std::transform(paths.begin(), paths.end(), places.begin(),
+                 [&](const std::string& path) { return trial.find(path, true).place + '/'; });
+  return places;
+}
 
 std::vector<update_facts> gather_updates(const device_facts& facts, const std::string& latest) {
   olm_trial trial;
   trial.go_by_rights_of_user(true);
   if (!latest.empty()) trial.put_link(latest_link, latest);
-  const named_dataset current{get_parent(facts.start.zoneinfo.now.target),
-                              trial.find(zoneinfo_link, true).place};
-  const named_dataset next{facts.latest.path, trial.find(latest_link, true).place};
+  // Parts of one update may be links into another.
+  const std::string current_path = get_parent(facts.start.zoneinfo.now.target);
+  const auto current =
+      find_places(trial, {zoneinfo_link, icutz_link, current_path + update_icu_directory});
+  const auto next =
+      find_places(trial, {latest_link, latest_link + std::string(update_icu_directory),
+                          latest_link + std::string(update_zoneinfo_directory)});
   std::vector<update_facts> updates;
   for (const olm_entry& entry : trial.list(update_area)) {
     const olm_entry directory = trial.find(entry.place, true);
     if (!directory.is(S_IFDIR)) continue;
-    const std::string name = entry.place.substr(entry.place.rfind('/') + 1);
-    const std::string path = update_area + name;
-    updates.push_back({name, current.is(path, directory) ? "current"
-                             : !next.is(path, directory) ? "unused"
-                             : facts.start.installs      ? "waiting"
-                                                         : "refused"});
+    const std::string path = update_area + entry.get_name();
+    const auto holds = [&](const std::vector<std::string>& places) {
+      return std::any_of(places.begin(), places.end(), [&](const std::string& place) {
+        return place.starts_with(directory.place + '/');
+      });
+    };
+    const bool is_current = path == current_path || holds(current);
+    const bool is_next = path == facts.latest.path || holds(next);
+    updates.push_back({entry.get_name(), is_current             ? "current"
+                                         : !is_next             ? "unused"
+                                         : facts.start.installs ? "waiting"
+                                                                : "refused"});
   }
   std::sort(updates.begin(), updates.end(), [](const auto& one, const auto& other) {
     return strverscmp(one.name.c_str(), other.name.c_str()) < 0;
@@ -67,10 +74,8 @@ std::vector<update_facts> gather_updates(const device_facts& facts, const std::s
 
 }  // namespace
 
-std::string get_parent(const std::string& path) { return path.substr(0, path.rfind('/')); }
-
-const olm_icu& get_icu(const olm_dataset& data) {
-  return dynamic_cast<const olm_icu&>(*data.components.back());
+const std::string& get_schema(const olm_dataset& data) {
+  return dynamic_cast<const olm_icu&>(*data.components.back()).schema;
 }
 
 device_facts gather_facts(const std::string& latest) {

@@ -35,8 +35,5 @@ struct device_facts {
 // program may not look at something that a start looks at.
 [[nodiscard]] device_facts gather_facts(const std::string& latest);
 
-// What stands before the last slash in `path`. Prints nothing.
-[[nodiscard]] std::string get_parent(const std::string& path);
-
-// The data set's ICU data. Prints nothing.
-[[nodiscard]] const olm_icu& get_icu(const olm_dataset& data);
+// The format of the data set's ICU data. Prints nothing.
+[[nodiscard]] const std::string& get_schema(const olm_dataset& data);

@@ -61,9 +61,9 @@ struct answer {
 
 // What becomes of `update`. Of a longer path, the start reads only the first bytes.
 const char* get_verdict(const device_facts& facts, const string& update) {
-  const string& target = facts.start.zoneinfo.next.target;
-  if (facts.start.installs) return facts.latest.path == update ? "used" : "refused";
-  return get_parent(target) == update ? "in-use" : "refused";
+  if (!facts.start.status || !facts.latest.data || facts.latest.path != update) return "refused";
+  if (facts.start.installs) return "used";
+  return get_parent(facts.start.zoneinfo.next.target) == update ? "in-use" : "refused";
 }
 
 int get_status(const start_forecast& start) {
@@ -74,23 +74,23 @@ int get_status(const start_forecast& start) {
 }
 
 answer find_answer(const question& asked) {
-  answer answer;
-  answer.facts = gather_facts(asked.update);
-  answer.because = explain_start(answer.facts);
-  answer.remarks = list_remarks(answer.facts);
-  answer.reasons = explain_latest(answer.facts);
-  answer.status = get_status(answer.facts.start);
-  if (asked.update.empty()) return answer;
-  answer.verdict = get_verdict(answer.facts, asked.update);
-  answer.status = answer.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
-  if (answer.facts.latest.path != asked.update) {
-    answer.reasons = {"a start cannot read that path from tz_latest"};
+  answer found;
+  found.facts = gather_facts(asked.update);
+  found.because = explain_start(found.facts);
+  found.remarks = list_remarks(found.facts);
+  found.reasons = explain_latest(found.facts);
+  found.status = get_status(found.facts.start);
+  if (asked.update.empty()) return found;
+  found.verdict = get_verdict(found.facts, asked.update);
+  found.status = found.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
+  if (found.facts.latest.path != asked.update) {
+    found.reasons = found.facts.start.record.obstacles;
+    found.reasons.emplace_back("a start cannot read that path from tz_latest");
   }
   if (asked.had_slash) {
-    answer.reasons.emplace_back(
-        "the target of tz_latest must not end in a slash, as this path did");
+    found.reasons.emplace_back("the target of tz_latest must not end in a slash, as this path did");
   }
-  return answer;
+  return found;
 }
 
 // --- For scripts ---
@@ -105,7 +105,7 @@ void print_keys(const char* key, const sentences& values) {
 
 void print_keys_of_dataset(const string& which, const dataset_facts& facts) {
   print_key((which + "-Version").c_str(), facts.data ? facts.data->name : "");
-  print_key((which + "-Schema").c_str(), facts.data ? get_icu(*facts.data).schema : "");
+  print_key((which + "-Schema").c_str(), facts.data ? get_schema(*facts.data) : "");
 }
 
 void print_query(const answer& answer) {
@@ -153,7 +153,7 @@ void print_texts(const char* label, const sentences& texts) {
 void print_dataset(const char* label, const dataset_facts& facts) {
   string text = facts.problem.empty() ? "none" : "cannot be used: " + facts.problem;
   if (facts.data) {
-    const string& schema = get_icu(*facts.data).schema;
+    const string& schema = get_schema(*facts.data);
     text = facts.data->name + ", schema " + (schema.empty() ? "none" : schema);
   }
   print_text(label, text);
@@ -187,10 +187,10 @@ void print_report(const answer& answer) {
 // --- What was asked ---
 
 void flush_output() {
-  if (std::fflush(stdout) != 0) err(cannot_be_told, "standard output");
+  if (std::fflush(stdout) != 0 || std::ferror(stdout) != 0) err(cannot_be_told, "standard output");
 }
 
-[[noreturn]] void end(const string& text) {
+[[noreturn]] void print_and_exit(const string& text) {
   static_cast<void>(std::fputs(text.c_str(), stdout));
   flush_output();
   std::exit(EXIT_SUCCESS);
@@ -217,9 +217,9 @@ question read_question(int count, char** arguments) {
         asked.root = optarg;
         break;
       case 'h':
-        end(string(usage) + '\n' + help);
+        print_and_exit(string(usage) + '\n' + help);
       case 'v':
-        end("tzdata-status " VERSION "\n");
+        print_and_exit("tzdata-status " VERSION "\n");
       default:
         refuse_usage();
     }
@@ -242,17 +242,17 @@ int main(int count, char* arguments[]) {
   if (asked.root != nullptr && (chroot(asked.root) != 0 || chdir("/") != 0))
     err(cannot_be_told, "--root=%s", asked.root);
   try {
-    const answer answer = find_answer(asked);
+    const answer found = find_answer(asked);
     if (asked.is_query) {
-      print_query(answer);
-    } else if (answer.verdict.empty()) {
-      print_report(answer);
+      print_query(found);
+    } else if (found.verdict.empty()) {
+      print_report(found);
     } else {
-      print_text(answer.verdict.c_str(), asked.update);
-      print_texts("", answer.reasons);
+      print_text(found.verdict.c_str(), asked.update);
+      print_texts("", found.reasons);
     }
     flush_output();
-    return answer.status;
+    return found.status;
   } catch (const std::exception& failure) {
     errx(cannot_be_told, "cannot be told: %s", clean(failure.what()).c_str());
   }
