@@ -30,41 +30,37 @@ dataset_facts gather_dataset(const std::function<std::string()>& find_path) {
   return facts;
 }
 
-// Where the links, or the parts of a data set, really are.
-std::vector<std::string> find_places(olm_trial& trial, const std::vector<std::string>& paths) {
-  std::vector<std::string> places(paths.size());
-  std::transform(paths.begin(), paths.end(), places.begin(),
-                 [&](const std::string& path) { return trial.find(path, true).place + '/'; });
-  return places;
-}
+// A place in which something is that a start, or a program, looks for.
+struct used_place {
+  std::string place;
+  std::string state;  // of the update that holds it
+};
 
 std::vector<update_facts> gather_updates(const device_facts& facts, const std::string& latest) {
   olm_trial trial;
   trial.go_by_rights_of_user(true);
   if (!latest.empty()) trial.put_link(latest_link, latest);
-  // Parts of one update may be links into another.
   const std::string current_path = get_parent(facts.start.zoneinfo.now.target);
-  const auto current =
-      find_places(trial, {zoneinfo_link, icutz_link, current_path + update_icu_directory});
-  const auto next =
-      find_places(trial, {latest_link, latest_link + std::string(update_icu_directory),
-                          latest_link + std::string(update_zoneinfo_directory)});
+  const std::string next = facts.start.installs ? "waiting" : "refused";
+  // The first that an update holds counts. Parts of one update may be links into another.
+  std::vector<used_place> used = {{current_path, "current"}, {facts.latest.path, next}};
+  for (const auto& [path, state] : {used_place{zoneinfo_link, "current"},
+                                    {latest_link, next},
+                                    {icutz_link, "current"},
+                                    {current_path + update_icu_directory, "current"},
+                                    {facts.latest.path + update_icu_directory, next},
+                                    {facts.latest.path + update_zoneinfo_directory, next}})
+    used.push_back({trial.find(path, true).place, state});
+
   std::vector<update_facts> updates;
   for (const olm_entry& entry : trial.list(update_area)) {
     const olm_entry directory = trial.find(entry.place, true);
     if (!directory.is(S_IFDIR)) continue;
     const std::string path = update_area + entry.get_name();
-    const auto holds = [&](const std::vector<std::string>& places) {
-      return std::any_of(places.begin(), places.end(), [&](const std::string& place) {
-        return place.starts_with(directory.place + '/');
-      });
-    };
-    const bool is_current = path == current_path || holds(current);
-    const bool is_next = path == facts.latest.path || holds(next);
-    updates.push_back({entry.get_name(), is_current             ? "current"
-                                         : !is_next             ? "unused"
-                                         : facts.start.installs ? "waiting"
-                                                                : "refused"});
+    const auto use = std::find_if(used.begin(), used.end(), [&](const used_place& one) {
+      return one.place == path || (one.place + '/').starts_with(directory.place + '/');
+    });
+    updates.push_back({entry.get_name(), use == used.end() ? "unused" : use->state});
   }
   std::sort(updates.begin(), updates.end(), [](const auto& one, const auto& other) {
     return strverscmp(one.name.c_str(), other.name.c_str()) < 0;
