@@ -147,6 +147,13 @@ const std::vector<question> questions = {
        mount(icutz.c_str(), icutz.c_str(), "", MS_BIND, nullptr);
      }},
 
+    {on_system + gone("/var/db/timezone") + folder("/usr/share/elsewhere") +
+         link_to("/var/db/timezone", "/usr/share/elsewhere"),
+     because("there is no zoneinfo link") + because("there is no latest update") +
+         reset("missing") + no_zone("/America/Los_Angeles") +
+         remark("the unit lets a start write below /var/db alone, but the links are in "
+                "/usr/share/elsewhere")},
+
     // What makes a start wait
     {on_first + gone(second + "/zoneinfo"), waits(second + "/zoneinfo/+VERSION"), "exit 1", "",
      [] {
@@ -307,6 +314,9 @@ TEST(status, is_asked_wrongly_or_cannot_tell) {
       {"read", "openat", first + "/icutz"},
       {"read", "openat", "/var/db/icu"},
   };
+  // Another has a lease on it.
+  EXPECT_EQ(ask({}, {"-P", version, "-e", "inject=openat:error=EAGAIN"}).at(6),
+            "next start  never ends: " + first + "/zoneinfo");
   for (const auto& [what, call, path] : rows) {
     lay_out(on_first + folder("/var/db/icu"));
     EXPECT_EQ(

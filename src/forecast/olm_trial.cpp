@@ -206,9 +206,9 @@ int olm_trial::refuse_making(const olm_entry& entry) {
   if (const int error = refuse_writing(entry); error != 0) return error;
   const olm_entry directory = look_up_directory(entry);
   if (!may(directory, change | search)) return EACCES;
-  if (!has_attribute(directory, STATX_ATTR_IMMUTABLE)) return 0;
-  note("nothing can be made in " + directory.place);
-  return EPERM;
+  const bool is_fixed = has_attribute(directory, STATX_ATTR_IMMUTABLE);
+  if (is_fixed) note("nothing can be made in " + directory.place);
+  return is_fixed ? EPERM : 0;
 }
 
 int olm_trial::refuse_removing(const olm_entry& entry) {
