@@ -67,7 +67,7 @@ const std::vector<question> questions = {
      "exit 0",
      second},
     {on_first,
-     {"Verdict: in-use", "Reason: the update 2020a.9.0 is the current data set",
+     {"Verdict: in-use", "Reason: it is in use already, and stays so",
       "Reason: the target of tz_latest must not end in a slash, as this path did"},
      "exit 0",
      first + "/"},

@@ -61,9 +61,10 @@ struct answer {
 
 // What becomes of `update`. Of a longer path, the start reads only the first bytes.
 const char* get_verdict(const device_facts& facts, const string& update) {
-  if (!facts.start.status || !facts.latest.data || facts.latest.path != update) return "refused";
-  if (facts.start.installs) return "used";
-  return get_parent(facts.start.zoneinfo.next.target) == update ? "in-use" : "refused";
+  if (!facts.start.status) return "refused";
+  if (facts.start.installs) return facts.latest.path == update ? "used" : "refused";
+  const bool stays = get_parent(facts.start.zoneinfo.next.target) == update;
+  return stays && update.starts_with(update_area) ? "in-use" : "refused";
 }
 
 int get_status(const start_forecast& start) {
@@ -83,7 +84,9 @@ answer find_answer(const question& asked) {
   if (asked.update.empty()) return found;
   found.verdict = get_verdict(found.facts, asked.update);
   found.status = found.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
-  if (found.facts.latest.path != asked.update) {
+  if (found.verdict == "in-use") {
+    found.reasons = {"it is in use already, and stays so"};
+  } else if (found.facts.latest.path != asked.update) {
     found.reasons = found.facts.start.record.obstacles;
     found.reasons.emplace_back("a start cannot read that path from tz_latest");
   }
