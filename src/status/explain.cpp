@@ -18,7 +18,7 @@ constexpr int longest_chain = 40;  // of links
 constexpr const char* state_directory = "/var/db";
 
 // Leaves out what has been said.
-void append(sentences& lines, const sentences& more) {
+void add_lines(sentences& lines, const sentences& more) {
   for (const string& line : more) {
     if (std::find(lines.begin(), lines.end(), line) == lines.end()) lines.push_back(line);
   }
@@ -38,7 +38,7 @@ const olm_dataset* find_weighed(const device_facts& facts) {
 
 sentences explain_problem(const string& what, const dataset_facts& facts) {
   sentences lines = {what + " cannot be used: " + facts.problem};
-  append(lines, facts.obstacles);
+  add_lines(lines, facts.obstacles);
   return lines;
 }
 
@@ -70,7 +70,7 @@ sentences explain_schema(const string& what, const dataset_facts& facts,
   const string has = schema.empty() ? " has no ICU data file that counts" : " has schema " + schema;
   sentences lines = {what + has + "; the system partition has schema " +
                      or_none(get_schema(system))};
-  if (schema.empty()) append(lines, explain_missing_schema(facts));
+  if (schema.empty()) add_lines(lines, explain_missing_schema(facts));
   return lines;
 }
 
@@ -99,7 +99,7 @@ sentences explain_refusal(const device_facts& facts, const olm_dataset& current)
   } else if (latest.version == olm_version()) {
     lines.push_back(what + " has a name that is no version");
   }
-  append(lines, explain_schema(what, facts.latest, system));
+  add_lines(lines, explain_schema(what, facts.latest, system));
   if (!(latest > current)) {
     lines.push_back(what + (current > latest ? " is older than" : " is not newer than") +
                     " the current data set " + current.name);
@@ -242,10 +242,10 @@ sentences explain_start(const device_facts& facts) {
     } else if (has_bad_link(facts.current)) {
       lines.push_back("the zoneinfo link leads to no data set: " + describe(start.zoneinfo.now));
     } else if (facts.current.data && !may_stay(*facts.current.data, *facts.system.data)) {
-      append(lines, explain_current(facts.current, *facts.system.data));
+      add_lines(lines, explain_current(facts.current, *facts.system.data));
     }
   }
-  append(lines, explain_latest(facts));
+  add_lines(lines, explain_latest(facts));
   return lines;
 }
 
@@ -255,10 +255,10 @@ sentences list_remarks(const device_facts& facts) {
   for (const string& obstacle : facts.start.record.obstacles) {
     if (std::find(said.begin(), said.end(), obstacle) == said.end()) lines.push_back(obstacle);
   }
-  if (facts.system.data) append(lines, remark_on_system(*facts.system.data));
-  append(lines, remark_on_halves(facts.start));
-  append(lines, remark_on_zone(facts.start));
-  append(lines, remark_on_system_localtime());
-  append(lines, remark_on_sandbox());
+  if (facts.system.data) add_lines(lines, remark_on_system(*facts.system.data));
+  add_lines(lines, remark_on_halves(facts.start));
+  add_lines(lines, remark_on_zone(facts.start));
+  add_lines(lines, remark_on_system_localtime());
+  add_lines(lines, remark_on_sandbox());
   return lines;
 }
