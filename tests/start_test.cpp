@@ -209,11 +209,11 @@ const std::vector<whole_start> starts = {
      .says = bad_link("/usr/share/zoneinfo") + invalid + refuse("2020a.10.0", "2019c.1.0"),
      .changes = system_links},
     {.name = "an update below another; ICU data reached by a link; a data file that is a link",
-     .before = on_first + link_to(latest, updates + "x/2020b.1.0") + update(updates + "2020b.1.0") +
-               link_to(updates + "x", ".") + gone(first + "/icutz") +
-               link_to(first + "/icutz", second + "/icutz") +
+     .before = on_first + link_to(latest, updates + "x/x/x/x/x/x/2020b.1.0") +
+               update(updates + "2020b.1.0") + link_to(updates + "x", ".") +
+               gone(first + "/icutz") + link_to(first + "/icutz", second + "/icutz") +
                link_to(second + "/icutz/icutz45l.dat", "icutz44l.dat"),
-     .says = unparsed("x/2020b.1.0") + refuse("x/2020b.1.0", "2020a.9.0")},
+     .says = unparsed("x/x/x/x/x/x/2020b.1.0") + refuse("x/x/x/x/x/x/2020b.1.0", "2020a.9.0")},
     {.name = "no ICU data, and a version with bytes that are letters or white space elsewhere",
      .before = on_system + gone("/usr/share/icu") + gone(second + "/icutz") +
                file(version, "%s\xA0\x85\0%n"s),
@@ -292,14 +292,16 @@ TEST(start, each_case) {
 // Where parts of a device are another user's, the start has only the rights of the unit.
 TEST(start, on_parts_of_another_user) {
   constexpr uid_t another = 1000;
-  const std::array<std::pair<string, mode_t>, 8> closed = {{{second, 0700},
-                                                            {second, 0705},
-                                                            {second + "/icutz", 0744},
-                                                            {second + "/zoneinfo/+VERSION", 0600},
-                                                            {version, 0640},
-                                                            {"/var/db/timezone", 0755},
-                                                            {"/var/db/timezone", 0777},
-                                                            {"/var/db/timezone", 01777}}};
+  const std::array<std::pair<string, mode_t>, 10> closed = {{{second, 0700},
+                                                             {second, 0705},
+                                                             {second + "/icutz", 0744},
+                                                             {second + "/icutz", 0711},
+                                                             {second + "/zoneinfo/+VERSION", 0600},
+                                                             {version, 0640},
+                                                             {"/var/db/timezone", 0700},
+                                                             {"/var/db/timezone", 0755},
+                                                             {"/var/db/timezone", 0777},
+                                                             {"/var/db/timezone", 01777}}};
   for (const auto& [path, mode] : closed) {
     for (const gid_t group : {0U, another}) {
       SCOPED_TRACE(path + " " + std::to_string(mode) + " " + std::to_string(group));

@@ -104,6 +104,9 @@ const std::vector<question> questions = {
          remark("44L is no schema, so no update fits the system partition"),
      "exit 0"},
     {on_system + file(version, "9999999999a"), because("the system partition " + large)},
+    {on_second + file(schema, "45l"),
+     because(
+         "the current data set 2020a.10.0 has schema 44l; the system partition has schema 45l")},
     {on_second + file(version, "2020b"),
      because("the current data set 2020a.10.0 is older than the system partition 2020b.1.0")},
 
@@ -253,6 +256,8 @@ TEST(status, reports_to_people) {
               "exit 0"}));
   EXPECT_EQ(ask({refused}).front(), "refused     " + refused);
   EXPECT_EQ(ask({"--root=" + first}).at(6), "next start  fails: none");
+  lay_out(on_first + gone(latest) + file(version, "2020b"));
+  EXPECT_EQ(ask({}).at(6), "next start  falls back to the system partition: " + system_zoneinfo);
   // Wherever a name of one word ends.
   lay_out(on_first + link_to(latest, updates + string(100, 'x')));
   EXPECT_EQ(ask({}).at(9), "            " + updates + string(100, 'x'));
