@@ -162,7 +162,8 @@ const std::vector<question> questions = {
        mkfifo((second + "/zoneinfo/+VERSION").c_str(), 0644);
      }},
     {on_first, waits(record), "exit 1", "", [] { mkfifo(record.c_str(), 0644); }},
-    {on_first + link_to(version, "/dev/zero"), waits("/dev/zero")},
+    {on_first, waits(version), "exit 1", "",
+     [] { std::filesystem::resize_file(version, 1U << 30U); }},
     {on_first + link_to(first + "/zoneinfo/+VERSION", "/dev/null"), waiting},
 
     // Why an update is refused

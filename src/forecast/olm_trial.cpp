@@ -3,7 +3,6 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/statvfs.h>
-#include <sys/sysmacros.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
@@ -290,9 +289,10 @@ std::string olm_trial::read_word_in(const std::string& place) {
   std::array<char, BUFSIZ> part{};
   std::string text;
   for (ssize_t length = 0; (length = read(file.get(), part.data(), part.size())) > 0;) {
+    const std::size_t known = text.size();
     text.append(part.data(), static_cast<std::size_t>(length));
-    text.erase(0, text.find_first_not_of(white_space));
-    const std::size_t end = text.find_first_of(white_space);
+    if (known == 0) text.erase(0, text.find_first_not_of(white_space));
+    const std::size_t end = text.find_first_of(white_space, known);
     if (end != std::string::npos) return text.substr(0, end);
     if (text.size() >= longest_word) end_at(place);
   }
