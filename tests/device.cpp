@@ -30,6 +30,8 @@ constexpr std::string_view arrow = "-> ";
 constexpr const char* directory = "(directory)";
 constexpr const char* nothing = "(nothing)";
 
+constexpr const char* boot_program = "/tzdata-boot";
+
 constexpr std::uintmax_t large = 3ULL << 30U;
 
 std::string read_file(const files::path& path) {
@@ -124,17 +126,22 @@ device look() {
   return found;
 }
 
-report start(const report& tracing) {
-  const char* emulator = std::getenv("TZDATA_SELECT_EMULATOR");
-  const char* program = std::getenv("TZDATA_SELECT_PROGRAM");
-  report command = report{"setpriv", "--bounding-set=-all", "--inh-caps=-all"} + trace(tracing);
+namespace {
+
+report run_program(const std::string& program, const report& tracing) {
+  const char* emulator = std::getenv("TZDATA_EMULATOR");
+  const char* programs = std::getenv("TZDATA_PROGRAMS");
+  report command = {"setpriv", "--bounding-set=-all", "--inh-caps=-all"};
+  // A leak checker cannot do its work in a process that confines itself.
+  if (program == boot_program) command = command + report{"env", "ASAN_OPTIONS=detect_leaks=0"};
+  command = command + trace(tracing);
   if (emulator != nullptr) command.emplace_back(emulator);
-  command.emplace_back(program != nullptr ? program : PROGRAM);
+  command.push_back((programs != nullptr ? programs : PROGRAMS) + program);
   report heard = {run(command)};
   const std::string name = "\ntzdata-select: ";
   std::string text = "\n";
   text += read_file(output);
-  text.pop_back();
+  text.erase(std::min(text.find("\nprofiling:"), text.size() - 1));
   for (std::size_t at = 0; (at = text.rfind(name)) != std::string::npos; text.erase(at)) {
     const std::string warning = text.substr(at + name.size());
     // One that lacks the text of errno altogether is passed on with all that surrounds it.
@@ -145,11 +152,27 @@ report start(const report& tracing) {
   return heard;
 }
 
-report ask(const report& arguments, const report& tracing) {
-  const std::string end = run(trace(tracing) + report{STATUS} + arguments);
-  report answer;
+}  // namespace
+
+report start(const report& tracing) { return run_program("/tzdata-select", tracing); }
+
+report boot(const report& tracing) {
+  report heard = run_program(boot_program, tracing);
+  if (heard.front().starts_with("\ntzdata-boot: ")) heard.erase(heard.begin());
+  return heard;
+}
+
+report hear(const report& command) {
+  const std::string end = run(command);
+  report heard;
   std::ifstream lines(output);
-  for (std::string line; std::getline(lines, line);) answer.push_back(line);
-  answer.push_back(end);
-  return answer;
+  // Confined, a program that counts its lines cannot write the counts down, and says so.
+  for (std::string line; std::getline(lines, line);)
+    if (!line.starts_with("profiling:")) heard.push_back(line);
+  heard.push_back(end);
+  return heard;
+}
+
+report ask(const report& arguments, const report& tracing) {
+  return hear(trace(tracing) + report{PROGRAMS "/tzdata-status"} + arguments);
 }

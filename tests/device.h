@@ -54,11 +54,18 @@ device look();
 // What a program said, and then how it ended, such as "exit 0" or "signal 11".
 using report = std::vector<std::string>;
 
-// Starts the built program with the rights that the unit has, under strace if there are `tracing`
-// options for it. The environment may name another program (TZDATA_SELECT_PROGRAM), and the
-// emulator that this needs (TZDATA_SELECT_EMULATOR). Gives its warnings, without the program's name
-// and the text of errno; a line that lacks the name belongs to the warning before it.
+// Runs the built tzdata-select with the rights that the unit has, under strace if there are
+// `tracing` options for it. The environment may name another directory of programs
+// (TZDATA_PROGRAMS), and the emulator that these need (TZDATA_EMULATOR). Gives its warnings,
+// without the program's name and the text of errno; a line that lacks the name belongs to the
+// warning before it.
 report start(const report& tracing = {});
+
+// The same for tzdata-boot, without what it says of confining itself.
+report boot(const report& tracing = {});
+
+// Runs a command with an empty environment. Gives its lines.
+report hear(const report& command);
 
 // Asks the built tzdata-status, under strace if there are `tracing` options. Gives its lines.
 report ask(const report& arguments, const report& tracing = {});

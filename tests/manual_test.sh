@@ -5,7 +5,7 @@ cd "$(dirname "$0")/.."
 
 # Whichever way something may be printed.
 list_printed_messages() {
-  cat src/{driver,dataset,fs}/*.{h,cpp} | tr '\n' ' ' |
+  cat src/{boot,driver,dataset,fs}/*.{h,cpp} | tr '\n' ' ' |
     grep -oE '((warnx?|errx?|perror|puts|printf)\(|cerr <<)[^";]*"[^"]*"' | sed 's/^[^"]*//' | sort
 }
 

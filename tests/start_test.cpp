@@ -77,6 +77,9 @@ const std::vector<whole_start> starts = {
      .says = given_up + fail_to_remove(icutz) + say("unlink of ICU softlink failed") +
              refuse("2020a.10.0", "2020a.10.0"),
      .changes = link_to(zoneinfo, system_zoneinfo) + file(marker, ""),
+     .boot_says = given_up + fail_to_remove(icutz) + say("unlink of ICU softlink failed") +
+                  refuse("2020a.10.0", "2020a.10.0") +
+                  say("Could not remove ICU link to " + second + "/icutz"),
      .tracing = {"-P", icutz, "-e", "inject=/^unlink:error=EIO"}},
     {.name = "an incompatible update",
      .before = on_first + gone(second + "/icutz") + file(second + "/icutz/icutz44b.dat", ""),
@@ -123,9 +126,43 @@ const std::vector<whole_start> starts = {
                folder("/var/db/icu"),
      .changes = gone(legacy_icutz) + gone("/var/db/icu") + link_to(icutz, "../../usr/share/icu")},
     {.name = "a zone among the system's own",
-     .before = on_system + gone(latest) + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
-     .says = correct(zoneinfo + "/Asia/Tokyo"),
-     .changes = link_to(zone, zoneinfo + "/Asia/Tokyo")},
+     .before = on_second + link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = refuse("2020a.10.0", "2020a.10.0") + correct(zoneinfo + "/Asia/Tokyo"),
+     .changes = link_to(zone, zoneinfo + "/Asia/Tokyo"),
+     .boot_says = correct(zoneinfo + "/Asia/Tokyo") + refuse("2020a.10.0", "2020a.10.0")},
+    {.name = "a zone that only the update in use has",
+     .before =
+         on_second + link_to(zone, "/usr/share/zoneinfo/new") + file(second + "/zoneinfo/new", ""),
+     .says = refuse("2020a.10.0", "2020a.10.0") + correct(zoneinfo + "/new"),
+     .changes = link_to(zone, zoneinfo + "/new")},
+
+    // What a boot mends
+    {.name = "a zone and an ICU link that were lost, and what else kills leave",
+     .before = on_second + gone(icutz) + gone(zone) + link_to(icutz + ".boot", "x") +
+               link_to(zone + ".boot", "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = refuse("2020a.10.0", "2020a.10.0") + no_zone,
+     .changes = default_zone,
+     .boot_says = say("Restoring localtime link to /usr/share/zoneinfo/Asia/Tokyo") +
+                  correct(zoneinfo + "/Asia/Tokyo") + refuse("2020a.10.0", "2020a.10.0") +
+                  say("Correcting ICU link to " + second + "/icutz"),
+     .mended = links(second) + link_to(zone, zoneinfo + "/Asia/Tokyo") + gone(zone + ".boot") +
+               gone(icutz + ".boot")},
+    {.name = "an ICU link that leads to an update by way of another link",
+     .before = on_system + gone(latest) + link_to(updates + "x", "2020a.9.0") +
+               link_to(icutz, "./zoneinfo/../icu") +
+               link_to("/usr/share/icu", "/var/db/timezone/tz/x"),
+     .boot_says = say("Removing ICU link to ./zoneinfo/../icu"),
+     .mended = gone(icutz)},
+    {.name = "an ICU link by another path to the update in use; a spare that is not needed",
+     .before =
+         on_second + link_to(icutz, "tz//2020a.10.0/./x/../icutz/") + link_to(zone + ".boot", "x"),
+     .says = refuse("2020a.10.0", "2020a.10.0"),
+     .mended = gone(zone + ".boot")},
+    {.name = "a directory in the place of the lost ICU link",
+     .before = on_second + gone(icutz) + file(icutz + "/kept", ""),
+     .says = refuse("2020a.10.0", "2020a.10.0"),
+     .boot_says = refuse("2020a.10.0", "2020a.10.0") +
+                  say("Could not correct ICU link to " + second + "/icutz")},
 
     // What fails
     {.name = "a directory in the ICU link's place, which keeps the legacy link as it is",
@@ -173,6 +210,10 @@ const std::vector<whole_start> starts = {
      .before = on_first + file(marker, ""),
      .says = fail_to_point(second + "/zoneinfo") + unable + fail_to_point(system_zoneinfo),
      .ends = "exit 1",
+     .prepare = [] { mount("", "/var/db", "", MS_REMOUNT | MS_RDONLY, nullptr); }},
+    {.name = "an ICU link of an update on a file system that can only be read",
+     .before = on_system + gone(latest) + link_to(icutz, first + "/icutz"),
+     .boot_says = say("Could not remove ICU link to " + first + "/icutz"),
      .prepare = [] { mount("", "/var/db", "", MS_REMOUNT | MS_RDONLY, nullptr); }},
     {.name = "directories in the places of the old links, the marker and the record",
      .before = on_first + gone(icutz) + folder(legacy_icutz) + file("/var/db/icu/kept", "") +
@@ -269,18 +310,25 @@ report describe(const report& heard) {
 
 }  // namespace
 
-// And tzdata-status forecasts it, where no call fails that nothing on the device makes fail.
+// What tzdata-boot makes of it, and tzdata-status forecasts where no call fails that nothing on the
+// device makes fail.
 TEST(start, each_case) {
   for (const auto& row : starts) {
     SCOPED_TRACE(row.name);
     lay_out(row.before);
     row.prepare();
+    EXPECT_EQ(start(row.tracing), row.says + report{row.ends});
+    const device changed = change(change({}, row.before), row.changes);
+    EXPECT_EQ(look(), changed);
+
+    lay_out(row.before);
+    row.prepare();
     const report forecasted = forecast();
     const string forecasted_target = forecast_target();
     EXPECT_EQ(look(), change({}, row.before));
-    const report heard = start(row.tracing);
-    EXPECT_EQ(heard, row.says + report{row.ends});
-    EXPECT_EQ(look(), change(change({}, row.before), row.changes));
+    const report heard = boot(row.tracing);
+    EXPECT_EQ(heard, row.boot_says.value_or(row.says) + report{row.ends});
+    EXPECT_EQ(look(), change(changed, row.mended));
     if (row.tracing.empty()) {
       EXPECT_EQ(forecasted, describe(heard));
       EXPECT_EQ(forecasted.front(),
@@ -311,7 +359,7 @@ TEST(start, on_parts_of_another_user) {
       if (chown(path.c_str(), another, group) != 0 || lchown(zoneinfo.c_str(), another, group) != 0)
         std::puts("there are no other users here");
       const report forecasted = forecast();
-      EXPECT_EQ(forecasted, describe(start()));
+      EXPECT_EQ(forecasted, describe(boot()));
     }
   }
 }

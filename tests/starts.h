@@ -2,6 +2,7 @@
 #pragma once
 
 #include <functional>
+#include <optional>
 
 #include "device.h"
 
@@ -11,6 +12,8 @@ struct whole_start {
   report says = {};      // the warnings, in order
   entries changes = {};  // what stands there otherwise afterwards; all else is as it was
   std::string ends = "exit 0";
+  std::optional<report> boot_says = {};   // what a boot says, if that is something else
+  entries mended = {};                    // what a boot changes after that
   report tracing = {};                    // options for strace, to have a call fail
   std::function<void()> prepare = [] {};  // what else is done to the device before
 };

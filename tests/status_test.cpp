@@ -43,9 +43,9 @@ report no_zone(const string& name) {
   return remark("after the next start, the local-time link leads to no zone file: " + zoneinfo +
                 name);
 }
-report no_icu(const string& name) {
-  return reason("the update " + name +
-                " has no ICU data file that counts; the system partition has schema 44l");
+report no_icu(const string& name, report (*as)(const string&) = reason) {
+  return as("the update " + name +
+            " has no ICU data file that counts; the system partition has schema 44l");
 }
 report waits(const string& path) {
   return because(path + " makes a start wait, or run out of memory");
@@ -73,10 +73,10 @@ const std::vector<question> questions = {
      first + "/"},
 
     // Halves that do not belong together
-    {on_second + gone(icutz), in_use + apart(second + "/zoneinfo", "none"), "exit 0"},
-    {on_second + file(icutz, ""), in_use + apart(second + "/zoneinfo", "a file"), "exit 0"},
-    {on_system + gone(latest) + link_to(icutz, first + "/icutz"),
-     because("there is no latest update") + apart(system_zoneinfo, first + "/icutz"), "exit 0"},
+    {on_second + file(icutz, ""), in_use + mended},
+    {on_second + folder(icutz), in_use + apart(second + "/zoneinfo", "a directory"), "exit 0"},
+    {on_system + gone(latest) + link_to(icutz, "/usr/share/icu"),
+     because("there is no latest update") + apart(system_zoneinfo, "/usr/share/icu"), "exit 0"},
     {on_first + gone(icutz), waiting + mended},
 
     // Zones
@@ -137,8 +137,6 @@ const std::vector<question> questions = {
          remark("after the next start, the local-time link is a directory")},
     {on_second + folder(second + "/zoneinfo/Asia/Tokio") + link_to(zone, zoneinfo + "/Asia/Tokio"),
      in_use + no_zone("/Asia/Tokio"), "exit 0"},
-    {on_second + gone(icutz), in_use + apart(second + "/zoneinfo", "a file"), "exit 0", "",
-     [] { mkfifo(icutz.c_str(), 0644); }},
     {on_first + folder("/var/db/icu") + folder(marker),
      because(icutz + " cannot be removed") + waiting + apart(system_zoneinfo, "a file"), "exit 1",
      "",
@@ -151,9 +149,14 @@ const std::vector<question> questions = {
     {on_system + gone("/var/db/timezone") + folder("/usr/share/elsewhere") +
          link_to("/var/db/timezone", "/usr/share/elsewhere"),
      because("there is no zoneinfo link") + because("there is no latest update") +
-         reset("missing") + no_zone("/America/Los_Angeles") +
-         remark("the unit lets a start write below /var/db alone, but the links are in "
-                "/usr/share/elsewhere")},
+         reset("missing") + no_zone("/America/Los_Angeles")},
+
+    // What lies elsewhere
+    {on_first + gone(second) + link_to(second, "/var/tmp"),
+     no_icu("2020a.10.0", because) + because("/var/tmp/icutz lies where a boot may not read"),
+     "exit 0", "", [] { std::filesystem::create_directory("/var/tmp/icutz"); }},
+    {on_first + link_to(record, "/usr/share/record"),
+     waiting + remark("/usr/share lies where a boot may not write")},
 
     // What makes a start wait
     {on_first + gone(second + "/zoneinfo"), waits(second + "/zoneinfo/+VERSION"), "exit 1", "",
@@ -164,7 +167,8 @@ const std::vector<question> questions = {
     {on_first, waits(record), "exit 1", "", [] { mkfifo(record.c_str(), 0644); }},
     {on_first, waits(version), "exit 1", "",
      [] { std::filesystem::resize_file(version, 1U << 30U); }},
-    {on_first + link_to(first + "/zoneinfo/+VERSION", "/dev/null"), waiting},
+    {on_first + link_to(first + "/zoneinfo/+VERSION", "/dev/null"),
+     waiting + remark("/dev/null lies where a boot may not read")},
 
     // Why an update is refused
     refuse(first + ".0", update(first + ".0"),
@@ -280,11 +284,12 @@ TEST(status, answers_scripts) {
                                       "Latest-Version: ",
                                       "Latest-Schema: ",
                                       "Next-Zoneinfo: " + second + "/zoneinfo",
-                                      "Next-Icutz: /usr/share/icu",
+                                      "Next-Icutz: " + second + "/icutz",
                                       "Next-Localtime: " + zoneinfo + "/Asia/Tokyo",
                                       "Next-Status: 0",
+                                      "Next-Warning: Correcting ICU link to " + second + "/icutz",
                                       "Because: there is no latest update",
-                                      apart(second + "/zoneinfo", "/usr/share/icu").front(),
+                                      mended.front(),
                                       misled.front(),
                                       "Update: 2018a current",
                                       "Update: 2020a.1 unused",
@@ -305,10 +310,9 @@ TEST(status, is_asked_wrongly_or_cannot_tell) {
     EXPECT_EQ(ask(wrong).back(), "exit 2");
   // What an ordinary user may not look at, or read, although the unit may.
   const std::array<string, 3> rows[] = {
-      {"look at", "statx", second + "/zoneinfo"},
-      {"read", "openat", version},
-      {"read", "openat", first + "/icutz"},
-      {"read", "openat", "/var/db/icu"},
+      {"look at", "statx", "/usr/share/icu"},     {"look at", "statx", zone + ".boot"},
+      {"look at", "statx", second + "/zoneinfo"}, {"read", "openat", version},
+      {"read", "openat", first + "/icutz"},       {"read", "openat", "/var/db/icu"},
   };
   // Another has a lease on it.
   EXPECT_EQ(ask({}, {"-P", version, "-e", "inject=openat:error=EAGAIN"}).at(6),

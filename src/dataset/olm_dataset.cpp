@@ -68,13 +68,15 @@ bool takes_over(const olm_dataset& latest, const olm_dataset& current, const olm
 
 std::string latest_dataset_path() { return fs::read_symlink(latest_link); }
 
+std::optional<std::string> find_dataset_path(const std::string& target) {
+  if (target == system_zoneinfo_directory) return "";
+  const std::size_t last_slash = target.rfind('/');
+  const bool is_in_update = is_below_update_area(target) && last_slash > update_area_length;
+  return is_in_update ? std::optional(target.substr(0, last_slash)) : std::nullopt;
+}
+
 std::string dataset_path_from_link(const std::string& target) {
-  if (is_below_update_area(target)) {
-    const std::size_t last_slash = target.rfind('/');
-    if (last_slash > update_area_length) return target.substr(0, last_slash);
-  } else if (target == system_zoneinfo_directory) {
-    return {};
-  }
+  if (auto path = find_dataset_path(target)) return *std::move(path);
   device::warn("Bad zoneinfo link %s", target.c_str());
   throw -1;
 }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -70,8 +71,11 @@ class olm_dataset {
 [[nodiscard]] std::string latest_dataset_path();
 
 // The path of the data set whose zone files a zoneinfo link with `target` leads to; empty for the
-// system partition. Prints "Bad zoneinfo link ..." and throws the int -1 when `target` is neither
-// the system partition's directory nor something in a directory below update_area.
+// system partition. None when `target` is neither the system partition's directory nor something in
+// a directory below update_area. Prints nothing.
+[[nodiscard]] std::optional<std::string> find_dataset_path(const std::string& target);
+
+// The same, but where there is none, prints "Bad zoneinfo link ..." and throws the int -1.
 [[nodiscard]] std::string dataset_path_from_link(const std::string& target);
 
 // The same for the link /var/db/timezone/zoneinfo as it is; a missing link is a bad one.

@@ -14,7 +14,7 @@ void protect_directory(const std::string& directory) {
 }
 
 void protect_directories() {
-  protect_directory("/var/db/timezone/");
+  protect_directory(state_directory);
   protect_directory(update_area);
 }
 

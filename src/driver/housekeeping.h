@@ -6,11 +6,14 @@
 // The marker that asks for a later clean-up of data no longer in use. Only its existence matters.
 inline constexpr const char* needs_cleanup_marker = "/var/db/timezone/needs_cleanup";
 
+// The directory of the links.
+inline constexpr const char* state_directory = "/var/db/timezone/";
+
 // Gives `directory` the protection class D, the one whose files can be read at any time. A
 // directory that cannot be opened is passed over. Prints nothing.
 void protect_directory(const std::string& directory);
 
-// protect_directory for /var/db/timezone/ and then for the updates below it. Prints nothing.
+// protect_directory for state_directory and then for the updates below it. Prints nothing.
 void protect_directories();
 
 // Moves the ICU link of earlier systems, /var/db/icutz, to /var/db/timezone/icutz. An old link that

@@ -22,15 +22,24 @@ void replace_localtime_link(const std::string& target) {
 
 }  // namespace
 
+std::string correct_localtime_target(const std::string& target) {
+  const bool is_system_zone = target.starts_with(system_prefix);
+  return is_system_zone ? zoneinfo_link + target.substr(std::strlen(system_prefix)) : "";
+}
+
+void announce_correction(const std::string& target) {
+  device::warn("Correcting localtime link to %s", target.c_str());
+}
+
 void repair_localtime_link() {
   try {
-    std::string target = fs::read_symlink(localtime_link);
+    const std::string target = fs::read_symlink(localtime_link);
     if (target.starts_with(zoneinfo_link)) return;
-    if (!target.starts_with(system_prefix)) throw -1;
-    target.replace(0, std::strlen(system_prefix), zoneinfo_link);
-    device::warn("Correcting localtime link to %s", target.c_str());
-    if (!fs::exists(target)) throw -1;
-    replace_localtime_link(target);
+    const std::string corrected = correct_localtime_target(target);
+    if (corrected.empty()) throw -1;
+    announce_correction(corrected);
+    if (!fs::exists(corrected)) throw -1;
+    replace_localtime_link(corrected);
   } catch (...) {
     device::warn("localtime link invalid; resetting to %s", default_zone);
     replace_localtime_link(default_target);

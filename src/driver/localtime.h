@@ -1,5 +1,7 @@
 #pragma once
 
+#include <string>
+
 // The link to the device's local zone.
 inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
 
@@ -10,3 +12,10 @@ inline constexpr const char* localtime_link = "/var/db/timezone/localtime";
 // "localtime link invalid; resetting to ...".
 // Throws errno when the link to the default zone cannot be made; the link is then missing.
 void repair_localtime_link();
+
+// The target by which a start replaces `target` if that leads into the system's own zone files and
+// the zone exists in the data set in use; else empty. Prints nothing.
+[[nodiscard]] std::string correct_localtime_target(const std::string& target);
+
+// Prints "Correcting localtime link to ...".
+void announce_correction(const std::string& target);

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "boot/boot.h"
 #include "dataset/olm_dataset.h"
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
@@ -16,9 +17,10 @@ start_forecast forecast_start(const std::string& latest) {
   forecast.zoneinfo.now = trial.find(zoneinfo_link);
   forecast.icutz.now = trial.find(icutz_link);
   forecast.localtime.now = trial.find(localtime_link);
+  forecast.fit_now = do_halves_fit();
   if (!latest.empty()) trial.put_link(latest_link, latest);
   trial.go_by_rights_of_user(false);
-  const int status = run_start();
+  const int status = run_boot();
   trial.require_told();
   forecast.record = trial.get_record();
   if (forecast.record.endless.empty()) forecast.status = status;
@@ -28,6 +30,7 @@ start_forecast forecast_start(const std::string& latest) {
   forecast.zoneinfo.next = trial.find(zoneinfo_link);
   forecast.icutz.next = trial.find(icutz_link);
   forecast.localtime.next = trial.find(localtime_link);
+  forecast.fit_next = do_halves_fit();
   forecast.zone_exists = trial.find(localtime_link, true).is(S_IFREG);
   return forecast;
 }

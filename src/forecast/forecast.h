@@ -1,4 +1,4 @@
-// What the next start of a device will do: the start itself, gone through in a trial.
+// What the next start of a device will do: what a boot runs, gone through in a trial.
 #pragma once
 
 #include <optional>
@@ -18,7 +18,9 @@ struct start_forecast {
   link_forecast zoneinfo;
   link_forecast icutz;
   link_forecast localtime;
-  bool installs = false;     // it takes the latest update into use
+  bool installs = false;  // it takes the latest update into use
+  bool fit_now = false;   // what do_halves_fit gives before and after it
+  bool fit_next = false;
   bool zone_exists = false;  // after it, the local-time link leads to a file
   trial_record record;
 };

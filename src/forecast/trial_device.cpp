@@ -38,6 +38,10 @@ int symlink(const char* target, const char* link_path) {
   return give(olm_trial::get().symlink(target, link_path));
 }
 
+int rename(const char* path, const char* new_path) {
+  return give(olm_trial::get().rename(path, new_path));
+}
+
 int remove(const char* path) { return give(olm_trial::get().remove(path)); }
 
 void set_protection_class(const char* /*directory*/, int /*protection_class*/) {}

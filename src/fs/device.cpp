@@ -38,6 +38,8 @@ ssize_t readlink(const char* path, char* target, std::size_t size) {
 
 int symlink(const char* target, const char* link_path) { return ::symlink(target, link_path); }
 
+int rename(const char* path, const char* new_path) { return std::rename(path, new_path); }
+
 int remove(const char* path) { return std::remove(path); }
 
 void set_protection_class(const char* directory, int protection_class) {

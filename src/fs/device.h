@@ -23,6 +23,9 @@ namespace device {
 [[nodiscard]] ssize_t readlink(const char* path, char* target, std::size_t size);
 [[nodiscard]] int symlink(const char* target, const char* link_path);
 
+// Both paths are in one directory.
+[[nodiscard]] int rename(const char* path, const char* new_path);
+
 // As the C library's: removes a file, a link or an empty directory.
 int remove(const char* path);
 

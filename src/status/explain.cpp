@@ -14,9 +14,6 @@ using std::string;
 constexpr const char* system_localtime = "/etc/localtime";
 constexpr int longest_chain = 40;  // of links
 
-// Below which the unit may write.
-constexpr const char* state_directory = "/var/db";
-
 // Leaves out what has been said.
 void add_lines(sentences& lines, const sentences& more) {
   for (const string& line : more) {
@@ -109,24 +106,18 @@ sentences explain_refusal(const device_facts& facts, const olm_dataset& current)
 
 // --- Links ---
 
-// Where the ICU link belongs while the zoneinfo link is like this: nowhere with the system
-// partition's zone files.
-string get_own_icutz(const olm_entry& zoneinfo) {
-  const bool is_in_update = zoneinfo.target.starts_with(update_area);
-  return is_in_update ? get_parent(zoneinfo.target) + update_icu_directory : "";
-}
-
-bool are_apart(const olm_entry& zoneinfo, const olm_entry& icutz) {
-  return icutz.target != get_own_icutz(zoneinfo) || (icutz.error == 0 && icutz.target.empty());
+// Beside the system partition's zone files, any ICU link is one too many.
+bool are_apart(bool fit, const olm_entry& zoneinfo, const olm_entry& icutz) {
+  return !fit || (icutz.error == 0 && !zoneinfo.target.starts_with(update_area));
 }
 
 sentences remark_on_halves(const start_forecast& start) {
   if (!start.zoneinfo.next.is(S_IFLNK)) return {};
-  if (are_apart(start.zoneinfo.next, start.icutz.next)) {
+  if (are_apart(start.fit_next, start.zoneinfo.next, start.icutz.next)) {
     return {"after the next start, the zone files and the ICU data do not belong together: " +
             describe(start.zoneinfo.next) + " and " + describe(start.icutz.next)};
   }
-  if (are_apart(start.zoneinfo.now, start.icutz.now)) {
+  if (are_apart(start.fit_now, start.zoneinfo.now, start.icutz.now)) {
     return {
         "the zone files and the ICU data do not belong together now; the next start mends that"};
   }
@@ -164,15 +155,6 @@ sentences remark_on_system_localtime() {
   }
   return {string(system_localtime) +
           " does not lead through the local-time link: " + describe(first)};
-}
-
-// Whether the unit's sandbox lets a start write where the links are.
-sentences remark_on_sandbox() {
-  olm_trial trial;
-  const string links = trial.find(get_parent(zoneinfo_link), true).place;
-  if (links.empty() || links.starts_with(trial.find(state_directory, true).place + '/')) return {};
-  return {"the unit lets a start write below " + string(state_directory) +
-          " alone, but the links are in " + links};
 }
 
 sentences remark_on_system(const olm_dataset& system) {
@@ -259,6 +241,5 @@ sentences list_remarks(const device_facts& facts) {
   add_lines(lines, remark_on_halves(facts.start));
   add_lines(lines, remark_on_zone(facts.start));
   add_lines(lines, remark_on_system_localtime());
-  add_lines(lines, remark_on_sandbox());
   return lines;
 }

@@ -1,4 +1,4 @@
-// What there is on a device, as a start would find it: read with the unit's rights.
+// What there is on a device, as a start would find it: read with the rights of a boot.
 #pragma once
 
 #include <optional>

@@ -26,7 +26,7 @@ constexpr std::size_t line_width = 80;
 
 constexpr const char* usage = "usage: tzdata-status [--query] [--root=DIRECTORY] [UPDATE]\n";
 constexpr const char* help =
-    "Tells which time-zone data a device uses, and what the next start of tzdata-select will do.\n"
+    "Tells which time-zone data a device uses, and what its next start will do.\n"
     "With UPDATE, the path of an update, tells whether the next start would use it.\n\n"
     "  --query           print a line \"Key: value\" for each thing, for scripts\n"
     "  --root=DIRECTORY  tell of the image in DIRECTORY (needs root)\n"
