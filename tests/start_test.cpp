@@ -158,6 +158,12 @@ const std::vector<whole_start> starts = {
          on_second + link_to(icutz, "tz//2020a.10.0/./x/../icutz/") + link_to(zone + ".boot", "x"),
      .says = refuse("2020a.10.0", "2020a.10.0"),
      .mended = gone(zone + ".boot")},
+    {.name = "an ICU link by the name of another update, which leads to the one in use",
+     .before = on_second + link_to(first, second) + link_to(icutz, first + "/icutz"),
+     .says = refuse("2020a.10.0", "2020a.10.0"),
+     .boot_says =
+         refuse("2020a.10.0", "2020a.10.0") + say("Correcting ICU link to " + second + "/icutz"),
+     .mended = links(second)},
     {.name = "a directory in the place of the lost ICU link",
      .before = on_second + gone(icutz) + file(icutz + "/kept", ""),
      .says = refuse("2020a.10.0", "2020a.10.0"),
@@ -212,7 +218,8 @@ const std::vector<whole_start> starts = {
      .ends = "exit 1",
      .prepare = [] { mount("", "/var/db", "", MS_REMOUNT | MS_RDONLY, nullptr); }},
     {.name = "an ICU link of an update on a file system that can only be read",
-     .before = on_system + gone(latest) + link_to(icutz, first + "/icutz"),
+     .before = on_system + gone(latest) + link_to(icutz, first + "/icutz") +
+               link_to(first + "/icutz", "/usr/share/icu"),
      .boot_says = say("Could not remove ICU link to " + first + "/icutz"),
      .prepare = [] { mount("", "/var/db", "", MS_REMOUNT | MS_RDONLY, nullptr); }},
     {.name = "directories in the places of the old links, the marker and the record",

@@ -10,7 +10,6 @@
 #include "dataset/olm_dataset.h"
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
-#include "driver/housekeeping.h"
 #include "driver/localtime.h"
 #include "driver/start.h"
 #include "fs/device.h"
@@ -26,9 +25,11 @@ std::optional<std::string> find_own_icu_directory() {
   return path;
 }
 
-bool is_icutz_link_below_updates() {
+// Whether `target`, which the ICU link holds, is below the updates' directory, or leads there.
+bool is_of_update(const std::string& target) {
   const std::string place = fs::simplify_path(icutz_link, true) + '/';
-  return place.starts_with(fs::simplify_path(update_area, true) + '/');
+  return fs::simplify_path(target, false).starts_with(update_area) ||
+         place.starts_with(fs::simplify_path(update_area, true) + '/');
 }
 
 void mend_icutz_link() {
@@ -91,11 +92,14 @@ void settle_zone() {
 
 bool do_halves_fit() {
   const auto own = find_own_icu_directory();
-  std::string target = fs::peek_symlink(icutz_link);
+  const std::string target = fs::peek_symlink(icutz_link);
   if (!own) return true;
-  if (own->empty()) return target.empty() || !is_icutz_link_below_updates();
-  if (!target.starts_with('/')) target.insert(0, state_directory);
-  return fs::simplify_path(target, false) == fs::simplify_path(*own, false);
+  if (own->empty()) return target.empty() || !is_of_update(target);
+  if (target == *own) return true;
+  // The name of another update is wrong, even if that leads to this one for now.
+  const auto named = find_dataset_path(fs::simplify_path(target, false));
+  if (named && *named + update_icu_directory != fs::simplify_path(*own, false)) return false;
+  return !target.empty() && fs::simplify_path(icutz_link, true) == fs::simplify_path(*own, true);
 }
 
 int run_boot() {
