@@ -16,12 +16,16 @@ const std::vector<std::pair<long, report>> tries = {
     {never, {"reads below /usr/share", "writes below /var/db"}},
     {1,
      {"reads a file", "reads through a link", "writes through a link", "makes a file",
-      "removes a file", "opens a device", "reads the kernel's settings"}},
+      "makes a link"}},
+    {3, {"cuts a file short"}},
+    {1, {"opens a device", "reads the kernel's settings"}},
     {6, {"signals", "reaches an abstract socket"}},
     {4, {"opens a port", "connects"}},
     {never,
      {"makes a socket", "starts a process", "changes a mode", "changes a time",
-      "changes an attribute", "reads another's limits"}},
+      "changes an attribute"}},
+    {1, {"removes a file"}},
+    {never, {"reads another's limits"}},
     {without, {"has powers"}},
     {1, {"runs a program"}}};
 
