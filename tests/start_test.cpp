@@ -67,6 +67,12 @@ const std::vector<whole_start> starts = {
      .before = on_second + file(version, "2020b"),
      .says = given_up + refuse("2020a.10.0", "2020a.10.0"),
      .changes = system_links + file(marker, "")},
+    {.name = "a system upgraded to the version of the latest update",
+     .before = on_first + file(version, "2020b") + update(updates + "2020b.1.0") +
+               link_to(latest, updates + "2020b.1.0"),
+     .says = given_up,
+     .changes =
+         links(updates + "2020b.1.0") + file(marker, "") + file(record, "2020b.1.0_2020b.1.0")},
     {.name = "a system upgraded past both updates; a marker that cannot be looked at",
      .before = on_first + file(version, "2020b"),
      .says = given_up + say("Cannot touch file " + marker),
@@ -142,7 +148,7 @@ const std::vector<whole_start> starts = {
                link_to(zone + ".boot", "/usr/share/zoneinfo/Asia/Tokyo"),
      .says = refuse("2020a.10.0", "2020a.10.0") + no_zone,
      .changes = default_zone,
-     .boot_says = say("Restoring localtime link to /usr/share/zoneinfo/Asia/Tokyo") +
+     .boot_says = say("Restoring link " + zone + " to /usr/share/zoneinfo/Asia/Tokyo") +
                   correct(zoneinfo + "/Asia/Tokyo") + refuse("2020a.10.0", "2020a.10.0") +
                   say("Correcting ICU link to " + second + "/icutz"),
      .mended = links(second) + link_to(zone, zoneinfo + "/Asia/Tokyo") + gone(zone + ".boot") +
@@ -154,8 +160,8 @@ const std::vector<whole_start> starts = {
      .boot_says = say("Removing ICU link to ./zoneinfo/../icu"),
      .mended = gone(icutz)},
     {.name = "an ICU link by another path to the update in use; a spare that is not needed",
-     .before =
-         on_second + link_to(icutz, "tz//2020a.10.0/./x/../icutz/") + link_to(zone + ".boot", "x"),
+     .before = on_second + link_to(icutz, "tz//2020a.10.0/./x/../icutz/") +
+               link_to(zone + ".boot", zoneinfo + "/Asia/Tokyo"),
      .says = refuse("2020a.10.0", "2020a.10.0"),
      .mended = gone(zone + ".boot")},
     {.name = "an ICU link by the name of another update, which leads to the one in use",

@@ -87,7 +87,8 @@ INSTANTIATE_TEST_SUITE_P(
     starts, sweep,
     testing::Values("a first update", "the next update",
                     "nothing new, and the marker of the last start",
-                    "a system upgraded past the update", "an incompatible update", "no links",
+                    "a system upgraded past the update", "an incompatible update",
+                    "a system upgraded to the version of the latest update", "no links",
                     "an ICU link of earlier systems", "a zone among the system's own",
                     "a zone that only the update in use has",
                     "a zone and an ICU link that were lost, and what else kills leave"));

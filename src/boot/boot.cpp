@@ -61,30 +61,47 @@ bool exists_everywhere(const std::string& zone) {
                      [&](const std::string& directory) { return fs::exists(directory + zone); });
 }
 
-// A start removes the local-time link before it makes the corrected one; a kill between the two
-// would lose the zone. So the link is corrected here, in one step, where each outcome of the start
-// would do the same. Elsewhere a spare keeps the zone until the start is over.
+// A start removes a link before it makes the new one, and settles the links one by one. A boot that
+// was killed meanwhile may have left what tells the next one too little: no zone, or the system
+// partition in use, which an update of the same version does not replace. So where a start may do
+// that, a spare keeps what a link held until the start is over.
+void keep_spare(const char* link, const std::string& target) {
+  static_cast<void>(device::symlink(target.c_str(), fs::get_spare_path(link).c_str()));
+}
+
+void keep_zoneinfo() {
+  const std::string target = fs::peek_symlink(zoneinfo_link);
+  const std::string latest = fs::peek_symlink(latest_link);
+  const auto path = find_dataset_path(target);
+  const bool has_icutz = !fs::peek_symlink(icutz_link).empty() || errno != ENOENT;
+  const bool is_current = latest.empty() || latest == path;
+  const bool is_settled = path && (path->empty() ? !has_icutz : is_current && do_halves_fit());
+  if (!is_settled && !target.empty()) keep_spare(zoneinfo_link, target);
+}
+
+// Better than a spare is to correct the link here, in one step, where each outcome of the start
+// would do the same.
 void keep_zone() {
   const std::string target = fs::peek_symlink(localtime_link);
   const std::string corrected = correct_localtime_target(target);
   if (corrected.empty()) return;
   if (!exists_everywhere(corrected.substr(std::strlen(zoneinfo_link)))) {
-    const std::string spare = fs::get_spare_path(localtime_link);
-    static_cast<void>(device::symlink(target.c_str(), spare.c_str()));
+    keep_spare(localtime_link, target);
   } else if (fs::replace_symlink(corrected, localtime_link)) {
     announce_correction(corrected);
   }
 }
 
-// Puts the spare in the place of a local-time link that is lost; else removes it.
-void settle_zone() {
-  const std::string spare = fs::get_spare_path(localtime_link);
-  const bool is_lost = fs::peek_symlink(localtime_link).empty() && errno == ENOENT;
-  const std::string target = is_lost ? fs::peek_symlink(spare) : "";
-  if (target.empty()) {
-    device::remove(spare.c_str());
-  } else if (device::rename(spare.c_str(), localtime_link) == 0) {
-    device::warn("Restoring localtime link to %s", target.c_str());
+void remove_spare(const char* link) { device::remove(fs::get_spare_path(link).c_str()); }
+
+// Gives a link back what it held before the start that was killed.
+void restore(const char* link) {
+  const std::string spare = fs::get_spare_path(link);
+  const std::string target = fs::peek_symlink(spare);
+  if (target.empty() || target == fs::peek_symlink(link)) {
+    remove_spare(link);
+  } else if (device::rename(spare.c_str(), link) == 0) {
+    device::warn("Restoring link %s to %s", link, target.c_str());
   }
 }
 
@@ -104,14 +121,18 @@ bool do_halves_fit() {
 
 int run_boot() {
   try {
-    settle_zone();
-    device::remove(fs::get_spare_path(icutz_link).c_str());
+    restore(zoneinfo_link);
+    restore(localtime_link);
+    remove_spare(icutz_link);
     keep_zone();
+    keep_zoneinfo();
   } catch (...) {
   }  // the start sees to what it can by itself
+  errno = 0;
   const int status = run_start();
   try {
-    settle_zone();
+    remove_spare(localtime_link);
+    remove_spare(zoneinfo_link);
     mend_icutz_link();
   } catch (...) {
   }  // the next boot mends it
