@@ -75,14 +75,27 @@ TEST(sandbox, may_be_refused) {
   }
 }
 
-// The directory of the updates may be a link to elsewhere; an update may not, unless nothing is
-// confined.
+// Also the text of errno, which neither confining itself nor looking for spares changes.
+TEST(sandbox, leaves_a_start_its_words) {
+  const entries before = on_second + link_to(at::legacy_icutz, "/usr/share/icu") +
+                         file(at::marker, "") + file("/var/db/icu", "");
+  lay_out(before);
+  const report heard = hear({PROGRAMS "/tzdata-select"});
+  EXPECT_TRUE(heard[0].ends_with(": Success")) << heard[0];
+  lay_out(before);
+  EXPECT_EQ(boot_as_root({}), heard);
+}
+
+// The directories of the system's ICU data and of the updates may be links to elsewhere; an
+// update may not, unless nothing is confined.
 TEST(sandbox, is_told_beforehand) {
   lay_out(update("/var/updates/2020a.9.0") + update("/var/elsewhere") +
-          link_to("/var/updates/2020a.10.0", "/var/elsewhere"));
+          link_to("/var/updates/2020a.10.0", "/var/elsewhere") +
+          file("/var/icu/icutzformat.txt", "44l"));
   const report unconfined = {"-e", "inject=landlock_create_ruleset:error=ENOSYS"};
   for (const auto& [tracing, used] : {std::pair{report{}, first}, {unconfined, second}}) {
-    lay_out(on_first + link_to(at::base + "tz", "/var/updates") +
+    lay_out(on_first + link_to("/usr/share/icu", "/var/icu") +
+            link_to(at::base + "tz", "/var/updates") +
             link_to(at::zone, "/usr/share/zoneinfo/Asia/Tokyo"));
     EXPECT_EQ(ask({"--query"}, tracing).at(9), "Next-Zoneinfo: " + used + "/zoneinfo");
     boot(tracing);

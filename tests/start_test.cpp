@@ -142,6 +142,18 @@ const std::vector<whole_start> starts = {
      .says = refuse("2020a.10.0", "2020a.10.0") + correct(zoneinfo + "/new"),
      .changes = link_to(zone, zoneinfo + "/new")},
 
+    {.name = "a zone that only the latest update, which is older, lacks",
+     .before = on_second + link_to(latest, first) + gone(first + "/zoneinfo/Asia/Tokyo") +
+               link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = refuse("2020a.9.0", "2020a.10.0") + correct(zoneinfo + "/Asia/Tokyo"),
+     .changes = link_to(zone, zoneinfo + "/Asia/Tokyo")},
+    {.name = "a zone that only the data set which goes out of use lacks",
+     .before = on_first + file(version, "none") + gone(first + "/zoneinfo/Asia/Tokyo") +
+               link_to(zone, "/usr/share/zoneinfo/Asia/Tokyo"),
+     .says = unparsed("none.1.0") + correct(zoneinfo + "/Asia/Tokyo"),
+     .changes = links(second) + link_to(zone, zoneinfo + "/Asia/Tokyo") + file(marker, "") +
+                file(record, "2020a.9.0_2020a.10.0")},
+
     // What a boot mends
     {.name = "a zone and an ICU link that were lost, and what else kills leave",
      .before = on_second + gone(icutz) + gone(zone) + link_to(icutz + ".boot", "x") +
@@ -159,13 +171,13 @@ const std::vector<whole_start> starts = {
                link_to("/usr/share/icu", "/var/db/timezone/tz/x"),
      .boot_says = say("Removing ICU link to ./zoneinfo/../icu"),
      .mended = gone(icutz)},
-    {.name = "an ICU link by another path to the update in use; a spare that is not needed",
+    {.name = "an ICU link by another path to the update in use; spares that are not needed",
      .before = on_second + link_to(icutz, "tz//2020a.10.0/./x/../icutz/") +
-               link_to(zone + ".boot", zoneinfo + "/Asia/Tokyo"),
+               link_to(icutz + ".boot", "x") + link_to(zone + ".boot", zoneinfo + "/Asia/Tokyo"),
      .says = refuse("2020a.10.0", "2020a.10.0"),
-     .mended = gone(zone + ".boot")},
+     .mended = gone(zone + ".boot") + gone(icutz + ".boot")},
     {.name = "an ICU link by the name of another update, which leads to the one in use",
-     .before = on_second + link_to(first, second) + link_to(icutz, first + "/icutz"),
+     .before = on_second + link_to(first, second) + link_to(icutz, "tz/2020a.9.0/icutz"),
      .says = refuse("2020a.10.0", "2020a.10.0"),
      .boot_says =
          refuse("2020a.10.0", "2020a.10.0") + say("Correcting ICU link to " + second + "/icutz"),

@@ -10,6 +10,7 @@
 #include "dataset/olm_dataset.h"
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
+#include "driver/housekeeping.h"
 #include "driver/localtime.h"
 #include "driver/start.h"
 #include "fs/device.h"
@@ -25,11 +26,16 @@ std::optional<std::string> find_own_icu_directory() {
   return path;
 }
 
+// The place that the ICU link names with `target`, without regard to other links.
+std::string get_named_place(const std::string& target) {
+  return fs::simplify_path(target.starts_with('/') ? target : state_directory + target, false);
+}
+
 // Whether `target`, which the ICU link holds, is below the updates' directory, or leads there.
 bool is_of_update(const std::string& target) {
-  const std::string place = fs::simplify_path(icutz_link, true) + '/';
-  return fs::simplify_path(target, false).starts_with(update_area) ||
-         place.starts_with(fs::simplify_path(update_area, true) + '/');
+  const std::string updates = fs::simplify_path(update_area, true) + '/';
+  return get_named_place(target).starts_with(update_area) ||
+         fs::simplify_path(icutz_link, true).starts_with(updates);
 }
 
 void mend_icutz_link() {
@@ -52,9 +58,9 @@ void mend_icutz_link() {
 // Whether `zone`, a path within a data set's zone files, exists in each data set that a start can
 // end with: the system partition's, the current one and the latest.
 bool exists_everywhere(const std::string& zone) {
-  std::vector<std::string> directories = {system_zoneinfo_directory};
   const std::string current = fs::peek_symlink(zoneinfo_link);
-  if (find_dataset_path(current)) directories.push_back(current);
+  if (!find_dataset_path(current) || !zone.starts_with('/')) return false;
+  std::vector<std::string> directories = {system_zoneinfo_directory, current};
   const std::string latest = fs::peek_symlink(latest_link);
   if (latest.starts_with(update_area)) directories.push_back(latest + update_zoneinfo_directory);
   return std::all_of(directories.begin(), directories.end(),
@@ -114,7 +120,7 @@ bool do_halves_fit() {
   if (own->empty()) return target.empty() || !is_of_update(target);
   if (target == *own) return true;
   // The name of another update is wrong, even if that leads to this one for now.
-  const auto named = find_dataset_path(fs::simplify_path(target, false));
+  const auto named = find_dataset_path(get_named_place(target));
   if (named && *named + update_icu_directory != fs::simplify_path(*own, false)) return false;
   return !target.empty() && fs::simplify_path(icutz_link, true) == fs::simplify_path(*own, true);
 }

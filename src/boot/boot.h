@@ -4,8 +4,9 @@
 
 // Sees to the local-time link, makes the start, and sees to the ICU link. Where nothing was
 // interrupted, and the links fit together, it leaves and prints what run_start does, but for the
-// place of one warning. Each change is one step, after which nothing is worse, and has one warning
-// of its own. Gives what run_start gives, throws nothing.
+// place of one warning. Each link that it mends is mended in one step, with a warning. If the start
+// then fails, a local-time link that was corrected before stays so. Gives what run_start gives,
+// throws nothing.
 [[nodiscard]] int run_boot();
 
 // Whether the ICU link is as it should be beside the zoneinfo link: with an update in use, it names

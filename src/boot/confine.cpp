@@ -50,7 +50,8 @@ long ask_version() {
   return syscall(SYS_landlock_create_ruleset, nullptr, 0, version_flag);
 }
 
-// All that a kernel of this version can keep a process from. More was added each time.
+// All that is known here of what a kernel of this version can keep a process from. More was added
+// with most versions.
 ruleset_attributes get_everything(long version) {
   constexpr std::array<int, 5> numbers_of_file_rights = {13, 14, 15, 15, 16};
   constexpr long with_connections = 4;
