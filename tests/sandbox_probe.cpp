@@ -2,11 +2,8 @@
 // a line for each thing that it could do. With an argument it stays outside, where all can be done:
 // so each try could fail. It does so in a private root only.
 #include <fcntl.h>
-#include <netinet/in.h>
-#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
 #include <sys/wait.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -54,8 +51,6 @@ bool has_powers(std::istream& status) {
   return answer;
 }
 
-sockaddr* as_address(void* address) { return static_cast<sockaddr*>(address); }
-
 }  // namespace
 
 int main(int count, char** /*arguments*/) {
@@ -64,15 +59,6 @@ int main(int count, char** /*arguments*/) {
     return 1;
   const char* const secret = access("/etc/shadow", R_OK) == 0 ? "/etc/shadow" : "/etc/passwd";
   std::ifstream status("/proc/self/status");
-  // A socket that got its name, an abstract one, from the kernel.
-  sockaddr_un abstract{.sun_family = AF_UNIX, .sun_path = {}};
-  socklen_t size = sizeof abstract.sun_family;
-  const int listener = socket(AF_UNIX, SOCK_STREAM, 0);
-  static_cast<void>(bind(listener, as_address(&abstract), size));
-  size = sizeof abstract;
-  static_cast<void>(getsockname(listener, as_address(&abstract), &size));
-  static_cast<void>(listen(listener, 1));
-
   if (count == 1) confine_process();
 
   say("reads below /usr/share", can_open("/usr/share/zoneinfo.default/+VERSION", O_RDONLY));
@@ -91,23 +77,14 @@ int main(int count, char** /*arguments*/) {
   say("opens a device below /var/db", can_open("/var/db/sandbox-device", O_RDWR));
   say("reads the kernel's settings", can_open("/proc/sys/kernel/hostname", O_RDONLY));
   say("signals", kill(getppid(), 0) == 0);
-  say("reaches an abstract socket",
-      connect(socket(AF_UNIX, SOCK_STREAM, 0), as_address(&abstract), size) == 0);
-  sockaddr_in local{};
-  local.sin_family = AF_INET;
-  say("opens a port", bind(socket(AF_INET, SOCK_STREAM, 0), as_address(&local), sizeof local) == 0);
-  // Perhaps nobody listens there, or there is no network.
-  local.sin_port = htons(9);
-  say("connects", connect(socket(AF_INET, SOCK_STREAM, 0), as_address(&local), sizeof local) == 0 ||
-                      errno == ECONNREFUSED || errno == ENETUNREACH);
+  const sockaddr local{.sa_family = AF_INET, .sa_data = {}};
+  say("opens a port", bind(socket(AF_INET, SOCK_STREAM, 0), &local, sizeof local) == 0);
   say("makes a socket", socket(AF_INET, SOCK_STREAM, 0) != -1);
   say("starts a process", can_start_process());
   say("changes a mode", chmod(outside, 0600) == 0);
   say("changes a time", utimensat(AT_FDCWD, outside, nullptr, 0) == 0);
   say("changes an attribute", setxattr(outside, "user.made", "", 0, 0) == 0 || errno == ENOTSUP);
   say("removes a file", unlink(outside) == 0);
-  rlimit limit{};
-  say("reads another's limits", prlimit(getppid(), RLIMIT_CORE, nullptr, &limit) == 0);
   say("has powers", has_powers(status));
   static_cast<void>(std::fflush(stdout));
   execl("/bin/echo", "echo", "runs a program", nullptr);

@@ -82,7 +82,9 @@ void keep_zoneinfo() {
   const bool has_icutz = !fs::peek_symlink(icutz_link).empty() || errno != ENOENT;
   const bool is_current = latest.empty() || latest == path;
   const bool is_settled = path && (path->empty() ? !has_icutz : is_current && do_halves_fit());
-  if (!is_settled && !target.empty()) keep_spare(zoneinfo_link, target);
+  // A link that cannot be understood is as good as none.
+  if (!is_settled && (has_icutz || !target.empty()))
+    keep_spare(zoneinfo_link, target.empty() ? "none" : target);
 }
 
 // Better than a spare is to correct the link here, in one step, where each outcome of the start
