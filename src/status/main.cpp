@@ -3,9 +3,7 @@
 #include <getopt.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <array>
-#include <cctype>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
@@ -13,6 +11,7 @@
 #include <string>
 #include <utility>
 
+#include "answer/answer.h"
 #include "status/explain.h"
 #include "status/facts.h"
 
@@ -20,7 +19,6 @@ namespace {
 
 using std::string;
 
-constexpr int cannot_be_told = 2;
 constexpr std::size_t label_width = 12;
 constexpr std::size_t line_width = 80;
 
@@ -34,14 +32,6 @@ constexpr const char* help =
     "  --version         print the version\n\n"
     "Exit status: 0 if the next start changes no link, 1 if it changes one or fails; with UPDATE,\n"
     "0 if it is used, 1 if it is refused. 2 if that cannot be told.\n";
-
-// Names come from outside: a control byte shows as a question mark, so that a line stays one.
-string clean(string text) {
-  std::replace_if(
-      text.begin(), text.end(),
-      [](char byte) { return std::iscntrl(static_cast<unsigned char>(byte)) != 0; }, '?');
-  return text;
-}
 
 struct question {
   bool is_query = false;
@@ -189,21 +179,6 @@ void print_report(const answer& answer) {
 
 // --- What was asked ---
 
-void flush_output() {
-  if (std::fflush(stdout) != 0 || std::ferror(stdout) != 0) err(cannot_be_told, "standard output");
-}
-
-[[noreturn]] void print_and_exit(const string& text) {
-  static_cast<void>(std::fputs(text.c_str(), stdout));
-  flush_output();
-  std::exit(EXIT_SUCCESS);
-}
-
-[[noreturn]] void refuse_usage() {
-  static_cast<void>(std::fputs(usage, stderr));
-  std::exit(cannot_be_told);
-}
-
 question read_question(int count, char** arguments) {
   const std::array<option, 5> options = {{{"query", no_argument, nullptr, 'q'},
                                           {"root", required_argument, nullptr, 'r'},
@@ -224,17 +199,17 @@ question read_question(int count, char** arguments) {
       case 'v':
         print_and_exit("tzdata-status " VERSION "\n");
       default:
-        refuse_usage();
+        refuse_usage(usage);
     }
   }
   const auto operands = std::span(arguments, static_cast<std::size_t>(count))
                             .subspan(static_cast<std::size_t>(optind));
-  if (operands.size() > 1) refuse_usage();
+  if (operands.size() > 1) refuse_usage(usage);
   if (operands.empty()) return asked;
   asked.update = operands.front();
   asked.had_slash = asked.update.ends_with('/');
   while (asked.update.ends_with('/')) asked.update.pop_back();
-  if (asked.update.empty()) refuse_usage();
+  if (asked.update.empty()) refuse_usage(usage);
   return asked;
 }
 
