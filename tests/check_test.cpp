@@ -87,7 +87,7 @@ TEST_F(check_test, tells_damage) {
       // Damaged zone files.
       {"truncate -s 300 zoneinfo/Test/Summer; echo x >zoneinfo/Test/Same",
        {"Australia/Darwin is no zone file", "Test/Same is no zone file",
-        "Test/Summer is 300 bytes long and says that it has 662"}},
+        "Test/Summer is 300 bytes long and says that it has 662 or more"}},
       {"truncate -s 20M zoneinfo/Test/Summer",
        {"Test/Summer is 20971520 bytes long, which is too much"}},
       {": >zoneinfo/+VERSION; rm zoneinfo/Test/Same",

@@ -13,10 +13,11 @@ void require(bool is_so, const char* reason) {
   if (!is_so) refuse(reason);
 }
 
-void require_length(std::size_t length, std::uint64_t named) {
+// What is lost of a file may itself say that there was more.
+void require_length(std::size_t length, std::uint64_t named, bool is_all) {
   if (length == named) return;
   refuse("is " + std::to_string(length) + " bytes long and says that it has " +
-         std::to_string(named));
+         std::to_string(named) + (is_all ? "" : " or more"));
 }
 
 // Takes `length` bytes off the front. There must be as many.
@@ -81,7 +82,8 @@ struct olm_zone_file::numbers {
 
   // Of a header that the rest of a file, which has `length` bytes, begins with.
   numbers(std::string_view data, std::size_t length, bool is_long) : size_of_time(is_long ? 8 : 4) {
-    if (data.size() < header_size) require_length(length, length - data.size() + header_size);
+    if (data.size() < header_size)
+      require_length(length, length - data.size() + header_size, false);
     data = data.substr(header_size - 6 * count_size);
     for (std::uint64_t* number :
          {&marks_of_ut, &marks_of_standard, &leap_seconds, &changes, &times, &characters}) {
@@ -157,7 +159,7 @@ olm_zone_file::olm_zone_file(std::string_view data) {
   require(version == 0 || (version >= first_long_version && version <= last_version),
           "is of a version of the format that is not known");
   const std::uint64_t end = header_size + counts.count_bytes();
-  if (version == 0 || length < end) require_length(length, end);
+  if (version == 0 || length < end) require_length(length, end, version == 0);
   table_ = read_table(data.substr(header_size), counts, 0);
   if (version == 0) return;
 
@@ -166,7 +168,7 @@ olm_zone_file::olm_zone_file(std::string_view data) {
   require(rest.starts_with("TZif") && rest[4] == version, "has no table with 64 bits");
   const std::uint64_t rule_begins = header_size + long_counts.count_bytes();
   // A line follows that holds no less than nothing.
-  if (rest.size() < rule_begins + 2) require_length(length, end + rule_begins + 2);
+  if (rest.size() < rule_begins + 2) require_length(length, end + rule_begins + 2, false);
   const table short_table = table_;
   table_ = read_table(rest.substr(header_size), long_counts, version);
   read_rule(rest.substr(rule_begins), version);
