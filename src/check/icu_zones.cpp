@@ -71,11 +71,8 @@ bool read_leaf(UResourceBundle* resource) {
     case URES_INT_VECTOR:
       read_all(ures_getIntVector(resource, &length, &status), length);
       break;
-    case URES_INT:
-      static_cast<void>(ures_getInt(resource, &status));
-      break;
     default:
-      return false;
+      static_cast<void>(ures_getInt(resource, &status));
   }
   return !has_failed(status);
 }
