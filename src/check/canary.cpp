@@ -134,6 +134,8 @@ void run_canary(const std::function<void(const canary_report&)>& work,
   if (pipe2(ends.data(), O_CLOEXEC) != 0) fail("pipe");
   const olm_descriptor output(ends.front());
   olm_descriptor input(ends.back());
+  // Who starts this program may have left it so that the kernel forgets how a child ended.
+  static_cast<void>(std::signal(SIGCHLD, SIG_DFL));
   const pid_t child = fork();
   if (child == -1) fail("fork");
   if (child == 0) be_canary(work, input.get());

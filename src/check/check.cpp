@@ -23,20 +23,21 @@ using std::string;
 using std::filesystem::path;
 using names = std::vector<string>;
 
-enum class kind { zone, other_zone, table };
+enum class file_kind { zone, other_zone, table };
 
 // What a file among the zone files is, by its name. Some have no zone, some one that ICU does not
 // have, or not by that name.
-kind get_kind(const string& name) {
+file_kind get_kind(const string& name) {
   constexpr std::array<const char*, 3> tables = {"tzdata.zi", "leapseconds", "leap-seconds.list"};
   constexpr std::array<const char*, 3> others = {"Factory", "posixrules", "localtime"};
   const auto is_one_of = [&](const auto& known) {
     return std::find(known.begin(), known.end(), name) != known.end();
   };
-  if ('/' + name == version_file || is_one_of(tables) || name.ends_with(".tab")) return kind::table;
+  if ('/' + name == version_file || is_one_of(tables) || name.ends_with(".tab"))
+    return file_kind::table;
   const bool is_other =
       is_one_of(others) || name.starts_with("posix/") || name.starts_with("right/");
-  return is_other ? kind::other_zone : kind::zone;
+  return is_other ? file_kind::other_zone : file_kind::zone;
 }
 
 void tell(const listener& add_reason, const string& name, const string& reason) {
@@ -53,7 +54,7 @@ names find_below(const char* directory, const names& all) {
 }
 
 // Reads the zone files, each once, whatever number of names it has. Gives those of zones.
-auto read_zones(const string& directory, const names& files, const listener& add_reason) {
+auto read_zones(const string& directory, const names& files, const canary_report& report) {
   struct outcome {
     std::shared_ptr<const olm_zone_file> file;
     string damage;
@@ -61,8 +62,9 @@ auto read_zones(const string& directory, const names& files, const listener& add
   std::map<string, outcome> outcomes;
   decltype(halves::zones) zones;
   for (const string& name : files) {
-    const kind kind = get_kind(name);
-    if (kind == kind::table) continue;
+    const file_kind kind = get_kind(name);
+    if (kind == file_kind::table) continue;
+    report.begin_step(name);
     const string place = std::filesystem::canonical(path(directory) / name);
     auto [found, is_new] = outcomes.try_emplace(place);
     auto& [file, damage] = found->second;
@@ -73,8 +75,8 @@ auto read_zones(const string& directory, const names& files, const listener& add
         damage = why.what();
       }
     }
-    if (!damage.empty()) tell(add_reason, name, damage);
-    if (kind == kind::zone) zones.emplace(name, file);
+    if (!damage.empty()) tell(report.add_reason, name, damage);
+    if (kind == file_kind::zone) zones.emplace(name, file);
   }
   return zones;
 }
@@ -92,10 +94,14 @@ void find_missing(const string& replaced, const halves& halves, const listener& 
   const auto pass = [](const string& /*reason*/) {};
   const names all = list_contents(replaced, pass);
   const names below = find_below(update_zoneinfo_directory, all);
+  bool has_zones = false;
   for (const string& name : below.empty() ? all : below) {
-    if (get_kind(name) == kind::zone && !halves.zones.contains(name))
+    if (get_kind(name) != file_kind::zone) continue;
+    has_zones = true;
+    if (!halves.zones.contains(name))
       tell(add_reason, name, "is missing, which " + replaced + " has");
   }
+  if (!has_zones) throw std::runtime_error(replaced + " has no zone files");
 }
 
 // Whether all four files of ICU's are whole.
@@ -154,7 +160,7 @@ void check_data_set(const check_request& request, const canary_report& report) {
   }
   halves halves;
   halves.since = request.since;
-  halves.zones = read_zones(zoneinfo, zone_names, add_reason);
+  halves.zones = read_zones(zoneinfo, zone_names, report);
   if (halves.zones.empty()) add_reason("there are no zone files");
   halves.version = read_version(zoneinfo, add_reason);
   if (!request.replaced.empty()) find_missing(request.replaced, halves, add_reason);

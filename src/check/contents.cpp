@@ -28,32 +28,40 @@ class olm_listing {
       : root_(filesystem::canonical(directory)), add_reason_(add_reason) {}
 
   std::vector<std::string> list() {
-    add_directory(root_, "");
+    add_directory({root_}, "");
     while (!directories_.empty()) {
-      const auto [directory, name] = directories_.back();
+      const found_directory next = directories_.back();
       directories_.pop_back();
-      list_directory(directory, name);
+      list_directory(next);
     }
     std::sort(files_.begin(), files_.end());
     return files_;
   }
 
  private:
-  void list_directory(const path& directory, const path& name) {
+  struct found_directory {
+    std::vector<path> way;  // its real path, after those of the directories above
+    path name;              // the path from the root, by which it was found
+  };
+
+  void list_directory(const found_directory& listed) {
     std::error_code error;
-    for (const auto& entry : filesystem::directory_iterator(directory, error))
-      add(entry.path(), name / entry.path().filename());
-    if (error && is_open(directory))
-      throw filesystem::filesystem_error("cannot be listed", directory, error);
+    for (const auto& entry : filesystem::directory_iterator(listed.way.back(), error)) {
+      constexpr int most_entries = 100'000;
+      if (++entries_ > most_entries) throw std::invalid_argument("there are too many files");
+      add(listed.way, entry.path(), listed.name / entry.path().filename());
+    }
+    if (error && is_open(listed.way.back()))
+      throw filesystem::filesystem_error("cannot be listed", listed.way.back(), error);
   }
 
-  // `name` is the path from the root, by which it was found.
-  void add(const path& place, const path& name) {
+  void add(std::vector<path> way, const path& place, const path& name) {
     const filesystem::file_status status = filesystem::symlink_status(place);
     if (filesystem::is_directory(status)) {
-      add_directory(place, name);
+      way.push_back(place);
+      add_directory(way, name);
     } else if (filesystem::is_symlink(status)) {
-      add_link(place, name);
+      add_link(way, place, name);
     } else if (filesystem::is_regular_file(status)) {
       if (!may_everybody(perms::others_read, place)) refuse(name, "may not be read by everybody");
       files_.push_back(name);
@@ -62,26 +70,24 @@ class olm_listing {
     }
   }
 
-  void add_directory(const path& place, const path& name) {
-    constexpr auto most_names = 16;
-    if (!is_open(place)) refuse(name, "may not be listed by everybody");
-    if (std::distance(name.begin(), name.end()) > most_names) {
-      refuse(name, "is too far below");
-    } else {
-      directories_.emplace_back(place, name);
-    }
+  void add_directory(const std::vector<path>& way, const path& name) {
+    if (!is_open(way.back())) refuse(name, "may not be listed by everybody");
+    directories_.push_back({way, name});
   }
 
-  void add_link(const path& place, const path& name) {
+  void add_link(std::vector<path> way, const path& place, const path& name) {
     std::error_code error;
     const path target = filesystem::canonical(place, error);
     if (error || !is_within(target, root_)) {
       if (name.filename() != "localtime")
         refuse(name, error ? "is a link that leads nowhere" : "is a link that leads elsewhere");
-    } else if (!filesystem::is_directory(target)) {
+    } else if (filesystem::is_regular_file(target)) {
       files_.push_back(name);
-    } else if (!is_within(place, target)) {  // one that leads up has nothing new
-      add_directory(target, name);
+    } else if (filesystem::is_directory(target) &&
+               std::find(way.begin(), way.end(), target) == way.end()) {
+      // One that leads up again has nothing new.
+      way.push_back(target);
+      add_directory(way, name);
     }
   }
 
@@ -95,8 +101,9 @@ class olm_listing {
 
   path root_;
   const listener& add_reason_;
-  std::vector<std::pair<path, path>> directories_;  // their places and names
+  std::vector<found_directory> directories_;
   std::vector<std::string> files_;
+  int entries_ = 0;
 };
 
 }  // namespace

@@ -11,8 +11,9 @@
 // The files below `directory`, by their paths from there, in order; also what links lead to. Adds a
 // reason for each entry that not everybody may read, that is no file, directory or link, and for
 // each link that leads out of `directory`. (The zone files of some systems have a link to the local
-// zone, which may.) Throws std::filesystem::filesystem_error for a directory that cannot be listed
-// although everybody may. Prints nothing.
+// zone, which may.) Throws std::invalid_argument when there are too many files, and
+// std::filesystem::filesystem_error for a directory that cannot be listed although everybody may.
+// Prints nothing.
 [[nodiscard]] std::vector<std::string> list_contents(const std::filesystem::path& directory,
                                                      const listener& add_reason);
 

@@ -122,7 +122,7 @@ void compare_halves(const halves& halves, const canary_report& report) {
   for (const char* const name : icu_files) {
     const string file = string(name) + icu_file_ending;
     report.begin_step(file);
-    if (walk_icu_file(name) && has_read(halves.icu_directory + '/' + file)) continue;
+    if (walk_icu_file(name) && has_read(file)) continue;
     report.add_reason(file + ": ICU cannot read it");
     is_read = false;
   }

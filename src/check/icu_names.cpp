@@ -68,7 +68,7 @@ constexpr std::array<std::array<instant, 2>, 2> exceptions = {
 class olm_own_zone final : public olm_clocks {
  public:
   explicit olm_own_zone(const std::string& rule)
-      : rule_(rule + (rule.ends_with("DT") ? ",M4.5.0,M10.5.0" : ""), false) {}
+      : rule_(rule + (rule.ends_with("DT") ? ",M4.5.0,M10.5.0" : "")) {}
 
   [[nodiscard]] local_time find(instant when) const override {
     const instant standard = when + rule_.get_standard().offset;

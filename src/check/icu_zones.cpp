@@ -15,6 +15,7 @@
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <fstream>
 #include <span>
 #include <stdexcept>
@@ -161,7 +162,10 @@ bool walk_icu_file(const std::string& name) {
   return root != nullptr && walk(std::move(root));
 }
 
-bool has_read(const std::string& path) {
+bool has_read(const std::string& file) {
+  std::string path = std::filesystem::canonical(file);
+  for (std::size_t at = 0; (at = path.find('\n', at)) != std::string::npos;)
+    path.replace(at, 1, "\\012");
   std::ifstream maps("/proc/self/maps");
   if (!maps) throw std::runtime_error("/proc/self/maps cannot be read");
   for (std::string line; std::getline(maps, line);)

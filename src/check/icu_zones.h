@@ -17,8 +17,8 @@ void set_icu_directory(const std::string& directory);
 // Reads all that is in the file `name`, such as zoneinfo64. False where ICU does not take it.
 [[nodiscard]] bool walk_icu_file(const std::string& name);
 
-// Whether ICU has read the file at `path`, whose real path this is, and not data of its own.
-[[nodiscard]] bool has_read(const std::string& path);
+// Whether ICU has read `file`, which is there, and not data of its own.
+[[nodiscard]] bool has_read(const std::string& file);
 
 // The release of the time-zone database that ICU says it has.
 [[nodiscard]] std::string get_icu_version();

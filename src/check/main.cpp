@@ -9,7 +9,9 @@
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
+#include <memory>
 #include <span>
+#include <stdexcept>
 #include <string>
 
 #include "answer/answer.h"
@@ -60,8 +62,9 @@ int read_year(const string& text) {
   constexpr int first = 1;
   constexpr int last = 2100;
   int year = 0;
-  const auto [rest, error] = std::from_chars(&*text.begin(), &*text.end(), year);
-  if (error != std::errc() || *rest != '\0' || year < first || year > last)
+  const char* const end = std::to_address(text.end());
+  const auto [rest, error] = std::from_chars(text.data(), end, year);
+  if (error != std::errc() || rest != end || year < first || year > last)
     errx(cannot_be_told, "--since=%s: no year from %d to %d", clean(text).c_str(), first, last);
   return year;
 }
@@ -81,6 +84,7 @@ check_request read_request(int count, char** arguments) {
         break;
       case 'r':
         request.replaced = optarg;
+        if (request.replaced.empty()) refuse_usage(usage);
         break;
       case 'h':
         print_and_exit(string(usage) + '\n' + help);
@@ -119,9 +123,13 @@ int main(int count, char* arguments[]) {
                                 .begin_step = [&](const string& step) { progress.show(step); }};
   try {
     check_data_set(request, report);
+  } catch (const std::invalid_argument& damage) {
+    report.add_reason(damage.what());
   } catch (const std::exception& failure) {
     progress.clear();
-    errx(cannot_be_told, "cannot be told: %s", clean(failure.what()).c_str());
+    warnx("cannot be told: %s", clean(failure.what()).c_str());
+    // One reason is enough, even if there may be others.
+    return status == EXIT_SUCCESS ? cannot_be_told : status;
   }
   progress.clear();
   flush_output();

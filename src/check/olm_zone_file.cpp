@@ -38,7 +38,6 @@ constexpr std::size_t count_size = 4;
 constexpr std::size_t kind_size = 6;
 constexpr std::size_t header_size = 44;
 constexpr char first_long_version = '2';
-constexpr char first_version_with_long_times = '3';
 constexpr char last_version = '4';
 
 // Leap seconds come one at a time. Only a later version of the format may leave out the first ones,
@@ -109,7 +108,11 @@ olm_zone_file::table olm_zone_file::read_table(std::string_view data, const numb
   const auto is_none_or = [](std::uint64_t number, std::uint64_t other) {
     return number == 0 || number == other;
   };
-  require(counts.times > 0 && counts.characters > 0 &&
+  // A change tells the time that follows by a byte, and a time the place of its name.
+  constexpr std::uint64_t most_times = 256;
+  constexpr std::uint64_t most_characters = 1024;
+  require(counts.times > 0 && counts.times <= most_times && counts.characters > 0 &&
+              counts.characters <= most_characters &&
               is_none_or(counts.marks_of_ut, counts.times) &&
               is_none_or(counts.marks_of_standard, counts.times),
           "has numbers in its header that do not fit");
@@ -118,6 +121,8 @@ olm_zone_file::table olm_zone_file::read_table(std::string_view data, const numb
     read.changes.push_back(get_number(take(data, counts.size_of_time)));
   require(std::is_sorted(read.changes.begin(), read.changes.end(), std::less_equal<>()),
           "has changes out of order");
+  constexpr instant latest = 800'000'000'000;  // after the year 27000, still within std::chrono's
+  require(read.changes.empty() || read.changes.back() < latest, "has changes in a far future");
   for (const char kind : take(data, counts.changes)) {
     read.kinds.push_back(static_cast<std::uint8_t>(kind));
     require(read.kinds.back() < counts.times, "has a change to a time that it does not have");
@@ -171,18 +176,18 @@ olm_zone_file::olm_zone_file(std::string_view data) {
   if (rest.size() < rule_begins + 2) require_length(length, end + rule_begins + 2, false);
   const table short_table = table_;
   table_ = read_table(rest.substr(header_size), long_counts, version);
-  read_rule(rest.substr(rule_begins), version);
+  read_rule(rest.substr(rule_begins));
   // A short table for nobody has no changes, and no name.
   if (counts.changes > 0 || counts.characters > 1) compare_tables(short_table);
 }
 
-void olm_zone_file::read_rule(std::string_view text, char version) {
+void olm_zone_file::read_rule(std::string_view text) {
   const std::size_t end = text.find('\n', 1);
   require(text.front() == '\n' && end != std::string_view::npos, "has no line at its end");
   require(end + 1 == text.size(), "goes on after the line at its end");
   if (end == 1) return;
   try {
-    rule_.emplace(text.substr(1, end - 1), version >= first_version_with_long_times);
+    rule_.emplace(text.substr(1, end - 1));
   } catch (const std::invalid_argument&) {
     refuse("has no rule in the line at its end");
   }
@@ -194,12 +199,11 @@ void olm_zone_file::compare_tables(const table& short_table) const {
   constexpr instant least = std::numeric_limits<std::int32_t>::min();
   constexpr instant most = std::numeric_limits<std::int32_t>::max();
   const auto& changes = short_table.changes;
-  // Before its first change, the short table may lack what came earlier.
-  const bool has_all =
-      changes.empty() || table_.changes.empty() || changes.front() == table_.changes.front();
+  // Before its first change, the short table may lack what came before 32 bits, but nothing else.
+  const bool has_all = table_.changes.empty() || table_.changes.front() > least;
   std::vector<instant> instants = changes;
-  if (has_all) instants.push_back(least);
-  list_changes(has_all ? least : changes.front(), most, instants);
+  if (has_all || changes.empty()) instants.push_back(least);
+  list_changes(least, most, instants);
   for (const instant when : instants)
     require(find(when) == short_table.find(when), "has two tables that differ");
 }

@@ -40,7 +40,7 @@ class olm_zone_file final : public olm_clocks {
   };
 
   table read_table(std::string_view data, const numbers& counts, char version);
-  void read_rule(std::string_view text, char version);
+  void read_rule(std::string_view text);
   void compare_tables(const table& short_table) const;
   void compare_rule() const;
 

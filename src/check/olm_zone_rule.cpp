@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <charconv>
+#include <limits>
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 namespace {
 
@@ -74,7 +76,7 @@ year find_year(instant when) {
 
 }  // namespace
 
-olm_zone_rule::yearly_date olm_zone_rule::read_date(std::string_view& text, bool has_long_times) {
+olm_zone_rule::yearly_date olm_zone_rule::read_date(std::string_view& text) {
   yearly_date date;
   if (!take(text, ',')) refuse();
   if (take(text, 'M')) {
@@ -87,17 +89,13 @@ olm_zone_rule::yearly_date olm_zone_rule::read_date(std::string_view& text, bool
     date.form = take(text, 'J') ? 'J' : '0';
     date.day = take_number(text, date.form == 'J' ? 1 : 0, 365);
   }
-  constexpr unsigned hours_of_day = 24;
   constexpr unsigned hours_of_week = 167;
   date.time = hours(2);
-  if (take(text, '/')) {
-    if (!has_long_times && text.starts_with('-')) refuse();
-    date.time = take_time(text, has_long_times ? hours_of_week : hours_of_day);
-  }
+  if (take(text, '/')) date.time = take_time(text, hours_of_week);
   return date;
 }
 
-olm_zone_rule::olm_zone_rule(std::string_view text, bool has_long_times) {
+olm_zone_rule::olm_zone_rule(std::string_view text) {
   standard_.name = take_name(text);
   standard_.offset = take_offset(text);
   if (text.empty()) {
@@ -108,8 +106,8 @@ olm_zone_rule::olm_zone_rule(std::string_view text, bool has_long_times) {
   daylight_.is_dst = true;
   constexpr std::int32_t hour = 3600;
   daylight_.offset = text.starts_with(',') ? standard_.offset + hour : take_offset(text);
-  start_ = read_date(text, has_long_times);
-  end_ = read_date(text, has_long_times);
+  start_ = read_date(text);
+  end_ = read_date(text);
   if (!text.empty()) refuse();
 }
 
@@ -139,9 +137,8 @@ local_time olm_zone_rule::find(instant when) const {
   if (!daylight_.is_dst) return standard_;
   instant last = std::numeric_limits<instant>::min();
   const local_time* found = &standard_;
-  const year middle = find_year(when);
-  for (year next = middle - std::chrono::years(1); next <= middle + std::chrono::years(1); ++next) {
-    const auto [end, start] = find_changes(next);
+  for (const int distance : {-1, 0, 1}) {
+    const auto [end, start] = find_changes(find_year(when) + std::chrono::years(distance));
     for (const auto& [change, after] : {std::pair(end, &standard_), std::pair(start, &daylight_)}) {
       if (change > when || change < last) continue;
       last = change;
@@ -153,9 +150,9 @@ local_time olm_zone_rule::find(instant when) const {
 
 void olm_zone_rule::list_changes(instant from, instant to, std::vector<instant>& changes) const {
   if (!daylight_.is_dst) return;
-  const year last = find_year(to) + std::chrono::years(1);
-  for (year next = find_year(from) - std::chrono::years(1); next <= last; ++next) {
-    for (const instant change : find_changes(next))
+  const int last = static_cast<int>(find_year(to)) + 1;
+  for (int next = static_cast<int>(find_year(from)) - 1; next <= last; ++next) {
+    for (const instant change : find_changes(year(next)))
       if (change > from && change < to) changes.push_back(change);
   }
 }

@@ -12,11 +12,11 @@
 // CET-1CEST,M3.5.0,M10.5.0/3, for example.
 class olm_zone_rule final : public olm_clocks {
  public:
-  // Reads the whole of `text`. With `has_long_times`, changes may be up to a week from their day
-  // (zone files from version 3 on). Throws std::invalid_argument when it is not such a rule; prints
+  // Reads the whole of `text`. Throws std::invalid_argument when it is not such a rule; prints
   // nothing.
-  olm_zone_rule(std::string_view text, bool has_long_times);
+  explicit olm_zone_rule(std::string_view text);
 
+  // `when` is within the years that std::chrono knows, as for all that is called here.
   [[nodiscard]] local_time find(instant when) const override;
   void list_changes(instant from, instant to, std::vector<instant>& changes) const override;
 
@@ -36,7 +36,7 @@ class olm_zone_rule final : public olm_clocks {
     [[nodiscard]] std::chrono::sys_seconds find(std::chrono::year year) const;
   };
 
-  static yearly_date read_date(std::string_view& text, bool has_long_times);
+  static yearly_date read_date(std::string_view& text);
   [[nodiscard]] std::array<instant, 2> find_changes(std::chrono::year year) const;
 
   local_time standard_;
