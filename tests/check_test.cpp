@@ -156,6 +156,7 @@ TEST_F(check_test, tells_damage) {
       {"mkdir -p a b; for i in 1 2 3 4 5 6 7 8 9; do mkdir $i; for j in 0 1 2 3; do "
        "ln -s ../$((i + 1)) $i/$j; done; done; mkdir 10; ln -s 1 a/up",
        {"a/up is a link that leads nowhere", "there are too many files"}},
+      {"mkdir 'a\nb:c'; cp -R icutz zoneinfo 'a\nb:c'", {}, {damaged + "/a\nb:c"}},
       {"mkdir store; mv icutz/zoneinfo64.res store; ln -s ../store/zoneinfo64.res icutz; mkdir a "
        "b; "
        "ln -s ../b a; ln -s ../a b",
