@@ -9,6 +9,7 @@
 #include <set>
 #include <vector>
 
+#include "check/icu_bundle.h"
 #include "check/icu_file.h"
 #include "check/icu_names.h"
 #include "check/icu_zones.h"

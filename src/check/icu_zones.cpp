@@ -6,21 +6,16 @@
 #include <unicode/timezone.h>
 #include <unicode/tznames.h>
 #include <unicode/tztrans.h>
-#include <unicode/ures.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <cstdint>
-#include <cstdlib>
-#include <cstring>
-#include <filesystem>
-#include <fstream>
 #include <span>
 #include <stdexcept>
 #include <string_view>
 #include <utility>
+
+#include "check/icu_bundle.h"
 
 namespace {
 
@@ -39,15 +34,6 @@ UnicodeString to_unicode(const std::string& text) { return UnicodeString::fromUT
 std::string to_text(const UnicodeString& text) {
   std::string converted;
   return text.toUTF8String(converted);
-}
-
-using bundle = std::unique_ptr<UResourceBundle, decltype(&ures_close)>;
-
-bundle open_bundle(const std::string& name) {
-  UErrorCode status = U_ZERO_ERROR;
-  bundle opened(ures_openDirect(nullptr, name.c_str(), &status), &ures_close);
-  if (has_failed(status)) opened.reset();
-  return opened;
 }
 
 // Reads each of the values; nobody looks at them, but what ends or hangs a reader does so here.
@@ -91,11 +77,8 @@ bool walk(bundle root) {
       if (!read_leaf(resource.get())) return false;
       continue;
     }
-    const std::int32_t size = ures_getSize(resource.get());
-    for (std::int32_t i = 0; i < size; ++i) {
-      UErrorCode status = U_ZERO_ERROR;
-      bundle inner(ures_getByIndex(resource.get(), i, nullptr, &status), &ures_close);
-      if (has_failed(status) || depth == most_depth) return false;
+    for (bundle& inner : list_inner(resource.get())) {
+      if (inner == nullptr || depth == most_depth) return false;
       resources.emplace_back(std::move(inner), depth + 1);
     }
   }
@@ -152,31 +135,9 @@ class olm_icu_clocks final : public olm_clocks {
 
 }  // namespace
 
-void set_icu_directory(const std::string& directory) {
-  if (chdir(directory.c_str()) != 0 || setenv("ICU_TIMEZONE_FILES_DIR", ".", 1) != 0)
-    throw std::runtime_error(directory + ": " + std::strerror(errno));
-}
-
 bool walk_icu_file(const std::string& name) {
   bundle root = open_bundle(name);
   return root != nullptr && walk(std::move(root));
-}
-
-bool has_read(const std::string& file) {
-  std::string path = std::filesystem::canonical(file);
-  for (std::size_t at = 0; (at = path.find('\n', at)) != std::string::npos;)
-    path.replace(at, 1, "\\012");
-  std::ifstream maps("/proc/self/maps");
-  if (!maps) throw std::runtime_error("/proc/self/maps cannot be read");
-  for (std::string line; std::getline(maps, line);)
-    if (line.ends_with(' ' + path)) return true;
-  return false;
-}
-
-std::string get_icu_version() {
-  UErrorCode status = U_ZERO_ERROR;
-  const char* const version = TimeZone::getTZDataVersion(status);
-  return has_failed(status) ? "" : version;
 }
 
 std::vector<std::string> list_icu_zones() {

@@ -25,6 +25,11 @@ class olm_zone_file final : public olm_clocks {
   // that they are set forward for.
   [[nodiscard]] bool has_negative_dst(instant since) const;
 
+  // The last change of its table, after which the rule holds; 1970 where it has none. Prints nothing.
+  [[nodiscard]] instant get_last_change() const {
+    return table_.changes.empty() ? 0 : table_.changes.back();
+  }
+
   [[nodiscard]] bool has_leap_seconds() const { return has_leap_seconds_; }
 
  private:
