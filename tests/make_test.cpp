@@ -1,0 +1,268 @@
+// Updates that tzdata-make-update makes of small releases.
+#include <gtest/gtest.h>
+#include <unicode/timezone.h>
+
+#include <algorithm>
+#include <array>
+#include <fstream>
+#include <optional>
+#include <sstream>
+
+#include "check/icu_bundle.h"
+#include "check/icu_zones.h"
+#include "check/olm_zone_file.h"
+#include "device.h"
+
+namespace {
+
+using std::string;
+
+const string place = "/var/tmp/";
+const string made = place + "made/";
+
+void run(const string& command) {
+  const report said = hear({"sh", "-c", "cd " + place + "; " + command});
+  EXPECT_EQ(said.back(), "exit 0") << command << said.front();
+}
+
+// Makes an update in an empty directory. Gives the last thing that is said, and the exit status.
+string make(const report& arguments) {
+  run("rm -rf made && mkdir made");
+  const report said = hear(report{PROGRAMS "/tzdata-make-update", "--output=" + made} + arguments);
+  return said.at(said.size() - 2) + ", " + said.back();
+}
+
+string tell_success(const string& version) {
+  return "tzdata-make-update: " + made + " has " + version + ".tar and " + version +
+         ".sha256, exit 0";
+}
+
+olm_zone_file read_zone(const string& name) {
+  std::ifstream file(made + "zoneinfo/" + name, std::ios::binary);
+  return olm_zone_file((std::ostringstream() << file.rdbuf()).str());
+}
+
+// How a zone's clocks change, and where they differ from what a zone file tells of them.
+struct zone_row {
+  string name;
+  string source;
+  bool is_cut = false;  // ICU has no such rule
+  // What ICU takes for daylight saving time in January and July of 2030, if not what the file does.
+  std::optional<std::pair<bool, bool>> dst = {};
+};
+
+const std::vector<zone_row> zones = {
+    {"Long_Ago",
+     "-15:56:08 - LMT 1844 Dec 31\n8:03:52 - LMT 1899 Sep 6 4u\n8 1 PST 1950 F 3\n8 - PST"},
+    {"Fixed", "0 - UTC"},
+    {"Always_Daylight", "3 - MSK 1990\n3 1 MSD"},
+    {"Daylight_For_Ever", "1 A STD/DST\nR A 2020 o - Mar 31 2 1 S"},
+    {"Far_Changes", "2 A STD/DST\nR A 2020 2090 - Apr Su>=1 0 1 S\nR A 2020 2090 - O 3 0 0 -"},
+    {"Ends_At_24", "2 A STD/DST\nR A 2023 ma - Apr lastF 0 1 S\nR A 2023 ma - O lastTh 24 0 -"},
+    {"Far_From_Its_Day",
+     "2 A STD/DST\nR A 2023 ma - Mar Sa<=30 2 1 S\nR A 2023 ma - O Sa<=30 2 0 -"},
+    {"Across_Months", "2 A STD/DST\nR A 2023 ma - Mar lastSa 2 1 S\nR A 2023 ma - O lastTh 50 0 -",
+     true},
+    {"Before_Midnight",
+     "-2 A STD/DST\nR A 2023 ma - Mar lastSu -1 1 S\nR A 2023 ma - O lastSu -1 0 -"},
+    {"Dates", "3:30 A STD/DST\nR A 2020 ma - Mar 22 0 1 S\nR A 2020 ma - S 22 0 0 -"},
+    {"Month_Ends", "1 A STD/DST\nR A 2020 ma - Mar 31 24 1 S\nR A 2020 ma - O 1 -1 0 -"},
+    {"South", "12:45 A STD/DST\nR A 2020 ma - Apr Su>=1 3 0 -\nR A 2020 ma - S lastSu 2:45s 1 S"},
+    {"February",
+     "5:30:20 A STD/DST\nR A 2020 ma - F lastSu 25 0:30 S\nR A 2020 ma - N Su>=1 2 0 -"},
+    {"Year_Ends", "1 A STD/DST\nR A 2020 ma - D lastSu 2 1 S\nR A 2020 ma - Ja Su>=8 2 0 -"},
+    {"One_Month", "1 A STD/DST\nR A 2020 ma - Mar Su>=1 2 1 S\nR A 2020 ma - Mar Su>=15 2 0 -"},
+    {"One_Month_Without",
+     "1 A STD/DST\nR A 2020 ma - Mar Su>=1 2 0 -\nR A 2020 ma - Mar Su>=15 2 1 S", true},
+    {"Double", "-5 A STD/DST\nR A 2020 ma - Apr Su>=1 0 2 S\nR A 2020 ma - S Su>=1 0 0 -"},
+    {"Rule_From_The_First",
+     "0 - -00 2005 F 12\n0 A STD/DST\nR A 2004 ma - Mar lastSu 1u 2 S\nR A 2004 ma - O lastSu 1u 0 "
+     "-"},
+    {"Another_Time_Before",
+     "1 - STD 2019 D 20\n2 A STD/DST\nR A 2020 ma - Mar lastSu 1u 1 S\nR A 2020 ma - O lastSu 1u 0 "
+     "-"},
+    {"Set_Back", "1 A STD/DST\nR A 2020 ma - O lastSu 1u -1 S\nR A 2020 ma - Mar lastSu 1u 0 -",
+     false, std::pair(false, true)},
+};
+
+string print_source() {
+  string source = "# version 2030b\n";
+  for (const zone_row& row : zones) {
+    // Rules, each with a name of its own, and the lines of the zone.
+    std::istringstream lines(row.source);
+    string zone = "Z Test/" + row.name + ' ';
+    string rules;
+    for (string line; std::getline(lines, line);) {
+      line = line.starts_with("R A ") ? "R " + row.name + line.substr(3) : line;
+      const std::size_t use = line.find(" A ");
+      if (use != string::npos) line.replace(use + 1, 1, row.name);
+      (line.starts_with("R ") ? rules : zone) += line + '\n';
+    }
+    source += rules + zone;
+  }
+  return source + "L Test/South Test/Link\nL Test/Link Europe/Paris # and so ICU's ECT\n";
+}
+
+// All changes of the clocks, and what they then show.
+std::vector<std::pair<instant, std::pair<std::int32_t, bool>>> list_times(const olm_clocks& clocks,
+                                                                          instant to,
+                                                                          bool has_dst) {
+  constexpr instant from = -15'000'000'000;
+  std::vector<instant> changes = {from};
+  clocks.list_changes(from, to, changes);
+  std::sort(changes.begin(), changes.end());
+  std::vector<std::pair<instant, std::pair<std::int32_t, bool>>> times;
+  for (const instant change : changes) {
+    const local_time time = clocks.find(change);
+    const std::pair shown(time.offset, has_dst && time.is_dst);
+    if (times.empty() || times.back().second != shown) times.emplace_back(change, shown);
+  }
+  return times;
+}
+
+TEST(make_test, gives_icu_the_same_times_for_ever) {
+  std::ofstream(place + "tzdata.zi") << print_source();
+  std::ofstream(place + "zone.tab") << "# codes\nNZ\t-4357-17633\tTest/South\n";
+  ASSERT_EQ(make({place + "tzdata.zi"}), tell_success("2030b.1.0"));
+  run("tar --extract --directory=made --file=made/2030b.1.0.tar");
+  set_icu_directory(made + "icutz");
+  string found;
+  constexpr instant year_2400 = 13'569'465'600;
+  constexpr instant year_3000 = 32'503'680'000;
+  for (const zone_row& row : zones) {
+    SCOPED_TRACE(row.name);
+    const auto icu = find_icu_zone("Test/" + row.name);
+    ASSERT_NE(icu, nullptr);
+    const instant to = row.is_cut ? year_2400 : year_3000;
+    EXPECT_EQ(list_times(*icu, to, !row.dst),
+              list_times(read_zone("Test/" + row.name), to, !row.dst));
+    if (row.is_cut) {
+      EXPECT_LT(list_times(*icu, year_3000, true).back().first, year_2400 + 2'000'000'000);
+    }
+    constexpr instant january = 1'893'456'000;
+    constexpr instant july = january + 15'638'400;
+    if (row.dst) {
+      EXPECT_EQ(*row.dst, std::pair(icu->find(january).is_dst, icu->find(july).is_dst));
+    }
+  }
+  // A new name has the region of a table or of its target, and ICU's own names are the zones' whose
+  // names they are.
+  for (const char* const name : {"Test/South", "Test/Link", "Test/Dates", "Europe/Paris", "ECT"}) {
+    std::array<char, 4> region{};
+    UErrorCode status = U_ZERO_ERROR;
+    icu::TimeZone::getRegion(name, region.data(), region.size(), status);
+    found += string(region.data()) + ' ' + std::to_string(icu::TimeZone::countEquivalentIDs(name)) +
+             ", ";
+  }
+  EXPECT_EQ(found, "NZ 4, NZ 4, 001 0, FR 4, FR 4, ");
+}
+
+// Makes a release with the sources that its archive has.
+const string release = R"(rm -rf release && mkdir release && cd release && echo 2030c >version &&
+  touch africa antarctica asia australasia europe southamerica etcetera factory backward &&
+  echo "Rule A 2020 max - Oct lastSun 1:00u -1:00 S
+    Rule A 2020 max - Mar lastSun 1:00u 0 -
+    Zone Test/Set_Back 1:00 - WET 2020 Mar lastSun 1:00u
+     1:00 A STD/DST" >northamerica
+  echo '{ sub(/max - Oct lastSun 1:00u -1:00 S/, "max - Oct lastSun 1:00u 0 -")
+    sub(/max - Mar lastSun 1:00u 0 -/, "max - Mar lastSun 1:00u 1:00 S")
+    sub(/^ *1:00 A STD.DST/, "0:00 A STD/DST"); print }' >ziguard.awk; )";
+
+struct run_row {
+  string prepare;  // a command, in the directory of the release
+  report arguments;
+  string ends;
+  string check = "true";  // what must hold then
+};
+
+TEST(make_test, takes_a_release_or_says_why_not) {
+  const string archive = place + "release.tar.gz";
+  const string pack = "tar --create --gzip --file=../release.tar.gz *";
+  const string program = "tzdata-make-update: ";
+  const std::vector<run_row> rows = {
+      {"true", {place + "release/"}, tell_success("2030c.1.0"), "mv made first"},
+      {pack, {archive}, tell_success("2030c.1.0"), "diff made first"},
+      {pack,
+       {"--number=2.10", archive},
+       tell_success("2030c.2.10"),
+       "cmp made/2030c.2.10.tar first/2030c.1.0.tar"},
+      // Links of an archive lead to what is not the release's.
+      {"ln -s /etc/passwd zone.tab; " + pack,
+       {archive},
+       tell_success("2030c.1.0"),
+       "diff made first"},
+      {"rm asia; ln -s /etc/passwd asia; " + pack,
+       {archive},
+       program + archive + " lacks a file, exit 1"},
+      {"echo 'BEGIN { system(\"touch /var/tmp/escaped\") }' >ziguard.awk",
+       {place + "release"},
+       program + "the release's ziguard.awk fails, exit 1",
+       "[ ! -e escaped ]"},
+      {"echo 'BEGIN { while (1) { } }' >ziguard.awk",
+       {place + "release"},
+       program + "the release's ziguard.awk fails, exit 1"},
+      {"echo Zone x y >>asia", {place + "release"}, program + "zic fails, exit 1"},
+      {"echo master >version",
+       {place + "release"},
+       program + place + "release says that its release is: master, exit 1"},
+      {"rm version",
+       {place + "release"},
+       program + place + "release does not say which release it is, exit 1"},
+      {"rm northamerica", {place + "release"}, program + place + "release is no release, exit 1"},
+      {"echo >../release.tar.gz", {archive}, program + archive + " cannot be unpacked, exit 1"},
+      {"true", {place + "nothing"}, program + place + "nothing is not there, exit 1"},
+      // Only an archive that is signed.
+      {pack + "; rm -f ../release.tar.gz.asc",
+       {"--keyring=key", archive},
+       program + archive + " has no signature " + archive + ".asc, exit 1"},
+      {pack + "; echo >../release.tar.gz.asc",
+       {"--keyring=key", archive},
+       program + archive + ": its signature is not good, exit 1"},
+      // Halves of two releases, and a base that is none.
+      {"sed -i 's/1:00 A/2:00 A/' northamerica; tar -xf ../first/2030c.1.0.tar icutz",
+       {"--icu=" + place + "release/icutz", place + "release"},
+       program + "2030c.1.0 is not sound, exit 1",
+       "[ -z \"$(ls -A made)\" ]"},
+      {"tar -xf ../first/2030c.1.0.tar icutz",
+       {"--icu=" + place + "release/icutz", place + "release"},
+       tell_success("2030c.1.0"),
+       "diff made first"},
+      {"tar -xf ../first/2030c.1.0.tar icutz",
+       {"--base=" + place + "release/icutz", place + "release"},
+       tell_success("2030c.1.0"),
+       "diff made first"},
+      {"tar -xf ../first/2030c.1.0.tar icutz; truncate -s 999 icutz/metaZones.res",
+       {"--base=" + place + "release/icutz", place + "release"},
+       program + "ICU's files cannot be made, exit 1"},
+      {"true",
+       {"--base=" + place + "nothing", place + "release"},
+       program + "ICU's files cannot be made, exit 1"},
+      {"true",
+       {"--number=1", archive},
+       "                          [--output=DIRECTORY] RELEASE, exit 2"},
+      {"true",
+       {"--base=x", "--icu=y", archive},
+       "                          [--output=DIRECTORY] RELEASE, exit 2"},
+      {"true", {}, "                          [--output=DIRECTORY] RELEASE, exit 2"},
+      {"true", {"--version"}, "tzdata-make-update " VERSION ", exit 0"},
+      // What may be published already stays.
+      {"true",
+       {"--output=" + place + "first", place + "release"},
+       "tzdata-make-update: /var/tmp/first has 2030c.1.0.tar and 2030c.1.0.sha256, exit 0"},
+      {"echo '# more' >zone.tab",
+       {"--output=" + place + "first", place + "release"},
+       program + place +
+           "first/2030c.1.0.tar is there already and differs: give another --number, or remove it, "
+           "exit 1",
+       "cd first && sha256sum <2030c.1.0.tar | cmp - 2030c.1.0.sha256"},
+  };
+  for (const run_row& row : rows) {
+    SCOPED_TRACE(row.prepare + testing::PrintToString(row.arguments));
+    run(release + row.prepare);
+    EXPECT_EQ(make(row.arguments), row.ends);
+    run(row.check);
+  }
+  EXPECT_EQ(hear({PROGRAMS "/tzdata-write-icu", "/", "/"}).back(), "exit 1");
+}
+
+}  // namespace
