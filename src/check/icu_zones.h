@@ -1,6 +1,6 @@
-// What ICU makes of the files in a directory. Damaged files can make ICU crash, hang and eat memory,
-// so all of this belongs into a canary. Each function throws std::invalid_argument where ICU finds
-// that it cannot go on; none prints.
+// What ICU makes of the files in a directory. Damaged files can make ICU crash, hang and eat
+// memory, so all of this belongs into a canary. Each function throws std::invalid_argument where
+// ICU finds that it cannot go on; none prints.
 #pragma once
 
 #include <memory>

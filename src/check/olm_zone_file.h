@@ -25,7 +25,8 @@ class olm_zone_file final : public olm_clocks {
   // that they are set forward for.
   [[nodiscard]] bool has_negative_dst(instant since) const;
 
-  // The last change of its table, after which the rule holds; 1970 where it has none. Prints nothing.
+  // The last change of its table, after which the rule holds; 1970 where it has none. Prints
+  // nothing.
   [[nodiscard]] instant get_last_change() const {
     return table_.changes.empty() ? 0 : table_.changes.back();
   }
