@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <array>
+#include <filesystem>
 #include <fstream>
 #include <optional>
 #include <sstream>
@@ -70,6 +71,8 @@ const std::vector<zone_row> zones = {
     {"South", "12:45 A STD/DST\nR A 2020 ma - Apr Su>=1 3 0 -\nR A 2020 ma - S lastSu 2:45s 1 S"},
     {"February",
      "5:30:20 A STD/DST\nR A 2020 ma - F lastSu 25 0:30 S\nR A 2020 ma - N Su>=1 2 0 -"},
+    {"Before_February_Ends",
+     "1 A STD/DST\nR A 2020 ma - F lastSu -25 1 S\nR A 2020 ma - N Su>=1 2 0 -", true},
     {"Year_Ends", "1 A STD/DST\nR A 2020 ma - D lastSu 2 1 S\nR A 2020 ma - Ja Su>=8 2 0 -"},
     {"One_Month", "1 A STD/DST\nR A 2020 ma - Mar Su>=1 2 1 S\nR A 2020 ma - Mar Su>=15 2 0 -"},
     {"One_Month_Without",
@@ -155,6 +158,7 @@ TEST(make_test, gives_icu_the_same_times_for_ever) {
              ", ";
   }
   EXPECT_EQ(found, "NZ 4, NZ 4, 001 0, FR 4, FR 4, ");
+  std::filesystem::current_path("/");
 }
 
 // Makes a release with the sources that its archive has.
@@ -163,10 +167,10 @@ const string release = R"(rm -rf release && mkdir release && cd release && echo 
   echo "Rule A 2020 max - Oct lastSun 1:00u -1:00 S
     Rule A 2020 max - Mar lastSun 1:00u 0 -
     Zone Test/Set_Back 1:00 - WET 2020 Mar lastSun 1:00u
-     1:00 A STD/DST" >northamerica
+     1:00 A WET/WEST" >northamerica
   echo '{ sub(/max - Oct lastSun 1:00u -1:00 S/, "max - Oct lastSun 1:00u 0 -")
     sub(/max - Mar lastSun 1:00u 0 -/, "max - Mar lastSun 1:00u 1:00 S")
-    sub(/^ *1:00 A STD.DST/, "0:00 A STD/DST"); print }' >ziguard.awk; )";
+    sub(/^ *1:00 A WET.WEST/, "0:00 A WET/WEST"); print }' >ziguard.awk; )";
 
 struct run_row {
   string prepare;  // a command, in the directory of the release
@@ -262,7 +266,35 @@ TEST(make_test, takes_a_release_or_says_why_not) {
     EXPECT_EQ(make(row.arguments), row.ends);
     run(row.check);
   }
-  EXPECT_EQ(hear({PROGRAMS "/tzdata-write-icu", "/", "/"}).back(), "exit 1");
+}
+
+// What only files that another program wrote can do to what writes ICU's text.
+TEST(make_test, believes_no_files) {
+  const string write = PROGRAMS "/tzdata-write-icu";
+  const string mark = "tzdata-write-icu: ";
+  const string files = place + "zoneinfo";
+  const string base = place + "icutz";
+  run("rm -f *.tar; " + release);
+  ASSERT_EQ(make({place + "release"}), tell_success("2030c.1.0"));
+  run("tar --extract --file=made/2030c.1.0.tar");
+  const std::vector<std::pair<report, string>> rows = {
+      {{write, files, files}, "usage: tzdata-write-icu MARKED ZONEINFO OUTPUT [BASE]"},
+      {{write, files, files, made}, "Test/Set_Back WEST is no mark of a time"},
+      {{write, files, place + "nothing", made}, place + "nothing/tzdata.zi cannot be read"},
+      {{"strace", "-o", "/dev/null", "-e", "inject=openat:error=ENOENT", "-P", "./metaZones.res",
+        write, files, files, made, base},
+       base + ": ICU cannot read its files"},
+      {{"sh", "-c", "cp $1/metaZones.res $1/zoneinfo64.res; $0 $2 $2 $3 $1", write, base, files,
+        made},
+       "ICU cannot read the base's Names"},
+      {{"sh", "-c", "echo 'L a b\nL b a' >>$1/tzdata.zi; $0 $1 $1 $2", write, files, made},
+       "the link a leads nowhere"},
+  };
+  for (const auto& [command, reason] : rows) {
+    const report said = hear(command);
+    EXPECT_EQ(said.front(), mark + reason);
+    EXPECT_EQ(said.back(), "exit 1");
+  }
 }
 
 }  // namespace
