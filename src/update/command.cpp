@@ -9,6 +9,7 @@
 #include <array>
 #include <cstdio>
 #include <memory>
+#include <sstream>
 
 #include "fs/olm_descriptor.h"
 #include "update/failure.h"
@@ -43,10 +44,13 @@ std::optional<command_result> run_command(std::vector<std::string> words, int in
   if (errno != 0) fail(words[0]);
   static_cast<void>(writer.close());
 
-  command_result result;
+  std::string output;
   std::array<char, BUFSIZ> part{};
   for (ssize_t length = 0; (length = read(reader.get(), part.data(), part.size())) > 0;)
-    result.output.append(part.data(), static_cast<std::size_t>(length));
+    output.append(part.data(), static_cast<std::size_t>(length));
+  command_result result;
+  std::istringstream all(output);
+  for (std::string line; std::getline(all, line);) result.lines.push_back(line);
   int status = 0;
   if (waitpid(process, &status, 0) == -1) fail(words[0]);
   constexpr int by_signal = 128;

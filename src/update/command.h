@@ -6,8 +6,8 @@
 #include <vector>
 
 struct command_result {
-  int status = 0;      // the exit status, or 128 and the number of the signal that ended it
-  std::string output;  // what it said on both streams
+  int status = 0;  // the exit status, or 128 and the number of the signal that ended it
+  std::vector<std::string> lines;  // what it said on both streams
 };
 
 // Runs the program words[0], found by PATH, with the rest as its arguments, and reads its standard

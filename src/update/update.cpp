@@ -9,7 +9,6 @@
 #include <array>
 #include <filesystem>
 #include <optional>
-#include <sstream>
 
 #include "answer/answer.h"
 #include "dataset/olm_icu.h"
@@ -86,13 +85,17 @@ void write_mark(int directory, const string& sum) {
     fail(path);
 }
 
+string describe_end(const command_result& result) {
+  return result.lines.empty() ? "status " + std::to_string(result.status) : result.lines.back();
+}
+
 // Gives the archive's sum.
 string require_sum(const olm_descriptor& archive, const string& sum_path) {
   const string sum = read_sum(sum_path);
   const auto counted = run_command({"sha256sum"}, archive.get());
-  if (!counted || counted->status != 0)
-    throw std::runtime_error("sha256sum cannot be asked" + (counted ? ": " + counted->output : ""));
-  if (counted->output.substr(0, sum_length) != sum)
+  if (!counted) throw std::runtime_error("there is no sha256sum");
+  if (counted->status != 0) throw std::runtime_error("sha256sum fails: " + describe_end(*counted));
+  if (counted->lines.empty() || counted->lines.front().substr(0, sum_length) != sum)
     throw olm_refusal({"the archive is damaged: its sum is not that in " + sum_path});
   return sum;
 }
@@ -104,11 +107,8 @@ sentences list_faults(const string& directory) {
   const olm_descriptor nothing(open("/dev/null", O_RDONLY | O_CLOEXEC));
   const auto answer = run_command({"tzdata-check", directory}, nothing.get());
   if (!answer || answer->status == 0) return {};
-  sentences lines;
-  std::istringstream output(answer->output);
-  for (string line; std::getline(output, line);) lines.push_back(line);
-  if (answer->status == 1) return lines;
-  throw std::runtime_error("tzdata-check fails: " + (lines.empty() ? "" : lines.back()));
+  if (answer->status == 1 && !answer->lines.empty()) return answer->lines;
+  throw std::runtime_error("tzdata-check cannot tell: " + describe_end(*answer));
 }
 
 sentences explain_waiting(const device_facts& facts, const string& update) {
@@ -160,6 +160,10 @@ string switch_to(const olm_state& state, const string& update, const string& pla
   sentences reasons = list_faults(place);
   if (verdict.word == "refused")
     reasons.insert(reasons.end(), verdict.reasons.begin(), verdict.reasons.end());
+  // The start after the next one would give it up.
+  if (facts.system.data && facts.latest.data && *facts.system.data > *facts.latest.data)
+    reasons.push_back(get_name(update) + " is older than the system partition " +
+                      facts.system.data->name);
   if (!allows_older) {
     const sentences waiting = explain_waiting(now, update);
     reasons.insert(reasons.end(), waiting.begin(), waiting.end());
