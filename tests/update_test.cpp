@@ -256,7 +256,7 @@ const std::vector<device_update> device_updates = {
     {on_first + link_to(third, second),
      {third},
      {"tzdata-update: " + third + ": is no directory right below " + updates, "exit 2"}},
-    {on_first, {first}, {"2020a.9.0 is in use already", "exit 0"}},
+    {on_second, {second}, {"2020a.10.0 is in use already", "exit 0"}},
     {on_second,
      {first},
      {"the update 2020a.9.0 is older than the current data set 2020a.10.0", "exit 1"}},

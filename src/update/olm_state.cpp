@@ -44,7 +44,7 @@ olm_state::olm_state()
     throw std::runtime_error("another tzdata-update is at work");
   }
   filesystem::remove_all(part_directory);
-  filesystem::remove(new_link);
+  if (filesystem::exists(filesystem::symlink_status(new_link))) filesystem::remove(new_link);
 }
 
 olm_state::~olm_state() {

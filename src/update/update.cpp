@@ -135,10 +135,25 @@ string describe_next(const start_forecast& start) {
 
 // --- Taking an update ---
 
-void remove_unused(const olm_state& state, const device_facts& facts) {
+bool is_unused(const device_facts& facts, const string& name) {
+  return std::any_of(facts.updates.begin(), facts.updates.end(), [&](const update_facts& update) {
+    return update.name == name && update.state == "unused";
+  });
+}
+
+// Where a link is there, its text must be known: it may name an update.
+bool is_known(const olm_entry& link) {
+  return link.error == ENOENT || (link.error == 0 && !link.target.empty());
+}
+
+// Removes what was not needed after the switch, neither by the forecast nor now.
+void remove_unused(const olm_state& state, const device_facts& forecast) {
+  const device_facts facts = gather_facts();
+  if (!is_known(facts.start.zoneinfo.now) || !is_known(facts.start.icutz.now)) return;
   for (const update_facts& update : facts.updates) {
     const string path = update_area + update.name;
-    if (update.state != "unused" || !read_version(update.name)) continue;
+    const bool is_needed = !is_unused(facts, update.name) || !is_unused(forecast, update.name);
+    if (is_needed || !read_version(update.name)) continue;
     try {
       if (!read_mark(path).empty()) state.remove_update(path);
     } catch (const std::exception& failure) {
@@ -180,9 +195,8 @@ string switch_to(const olm_state& state, const string& update, const string& pla
     throw;
   }
   state.sync_links();
-  const device_facts after = gather_facts();
-  remove_unused(state, after);
-  return describe_next(after.start);
+  remove_unused(state, facts);
+  return describe_next(facts.start);
 }
 
 // --- Going back ---
@@ -243,9 +257,10 @@ string go_back() {
   const device_facts facts = gather_facts();
   const start_forecast& start = facts.start;
   if (start.installs) {
+    const start_forecast forecast = forecast_start({{latest_link, facts.weighed.path}});
     state.set_link(latest_link, facts.weighed.path);
     state.sync_links();
-    return describe_next(forecast_start());
+    return describe_next(forecast);
   }
   if (!start.zoneinfo.now.equals(start.zoneinfo.next)) return describe_next(start) + " already";
   if (start.zoneinfo.next.target == system_zoneinfo_directory)
@@ -264,7 +279,7 @@ string go_back() {
     state.sync_links();
     state.set_link(spare, target);
     state.sync_links();
-    return describe_next(forecast_start());
+    return describe_next(forecast);
   }
   throw std::runtime_error("the next start would not go back; tzdata-status says what is wrong");
 }
