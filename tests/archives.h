@@ -1,6 +1,8 @@
 // Archives for the tests of tzdata-update, good and bad.
 #pragma once
 
+#include <sys/mount.h>
+
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -60,4 +62,12 @@ inline const tar_entries good_update = {
 inline void publish(const std::string& path, const std::string& bytes) {
   std::ofstream(path + ".tar") << bytes;
   hear({"sh", "-c", "sha256sum <" + path + ".tar >" + path + ".sha256"});
+}
+
+// Puts a shell script where programs are looked for first. It goes with the private root.
+inline void make_program(const std::string& name, const std::string& lines) {
+  const std::string path = "/usr/local/bin/" + name;
+  static_cast<void>(mount("tmpfs", "/usr/local/bin", "tmpfs", 0, "mode=755"));
+  std::ofstream(path) << "#!/bin/sh\n" << lines << '\n';
+  std::filesystem::permissions(path, std::filesystem::perms(0755));
 }

@@ -118,7 +118,10 @@ const std::vector<update_sweep_case> update_sweep_cases = {
     {"back", on_second, run_update<back>},
 };
 
-class update_sweep : public testing::TestWithParam<std::string> {};
+class update_sweep : public testing::TestWithParam<std::string> {
+ protected:
+  void SetUp() override { make_program("tzdata-check", "exit 0"); }
+};
 
 // What a start would make the zoneinfo link.
 std::string find_next() { return ask({"--query"}).at(9); }
@@ -144,7 +147,7 @@ TEST_P(update_sweep, is_finished_by_the_next_one) {
     // Forecasts look at the same things again and again. Nothing is lost with one of these looks.
     if (seen[call.substr(0, call.rfind(" = "))]++ > 0) continue;
     const bool is_look = call.starts_with("statx(") || call.starts_with("readlink(");
-    for (const std::string what :
+    for (const std::string& what :
          is_look ? report{"error=EIO"}
                  : report{"error=EIO", "error=ENOSPC", "error=EROFS", "signal=KILL"}) {
       SCOPED_TRACE(what + " at " + call);
