@@ -441,4 +441,62 @@ TEST_F(update_on_device, is_asked_wrongly_or_cannot) {
             (report{name + "this is no device: there is no directory " + updates, "exit 2"}));
 }
 
+// --- tzdata-set-zone ---
+
+report set_zone(const string& name) { return hear({PROGRAMS "/install/tzdata-set-zone", name}); }
+
+TEST(set_zone, sets_what_programs_go_by) {
+  const string berlin = zoneinfo + "/Europe/Berlin";
+  const string system_zones = "/usr/share/zoneinfo";
+  const string etc = "/etc/localtime";
+  const entries with_berlin = on_first + file(first + "/zoneinfo/Europe/Berlin", "TZif2") +
+                              link_to(zone + ".boot", "x") + link_to(zone + ".new", "y");
+  struct row {
+    entries before;
+    string etc_before;
+    string etc_after;
+  };
+  ASSERT_EQ(mount("tmpfs", "/etc", "tmpfs", 0, nullptr), 0);
+  ASSERT_EQ(mount("tmpfs", "/run", "tmpfs", 0, nullptr), 0);
+  files::create_directories("/run/systemd/system");
+  for (const auto& [before, etc_before, etc_after] : {
+           row{with_berlin, zone, zone},
+           row{with_berlin + link_to(system_zones, zoneinfo), "../usr/share/zoneinfo/UTC",
+               system_zones + "/Europe/Berlin"},
+           row{with_berlin + folder(system_zones), system_zones + "/UTC", zone},
+       }) {
+    lay_out(before);
+    files::remove(etc);
+    files::create_symlink(etc_before, etc);
+    make_program("systemctl", "echo \"$@\"; [ $2 != is-active ]");
+    const device found = look();
+    EXPECT_EQ(set_zone("Europe/Berlin"), (report{"--quiet is-active tzdata-zone-name.service",
+                                                 "--quiet is-enabled tzdata-zone-name.service",
+                                                 "restart tzdata-zone-name.service", "exit 0"}));
+    EXPECT_EQ(look(),
+              change(found, link_to(zone, berlin) + gone(zone + ".boot") + gone(zone + ".new")));
+    EXPECT_EQ(files::read_symlink(etc), etc_after);
+  }
+}
+
+TEST(set_zone, refuses_what_is_no_zone) {
+  lay_out(on_first + file(first + "/zoneinfo/posix/UTC", "TZif2") +
+          file(first + "/zoneinfo/UTC", "TZif2") + link_to(first + "/zoneinfo/out", "/etc/UTC") +
+          link_to(first + "/zoneinfo/localtime", "UTC"));
+  ASSERT_EQ(mount("tmpfs", "/etc", "tmpfs", 0, nullptr), 0);
+  std::ofstream("/etc/UTC") << "TZif2";
+  const device before = look();
+  for (const string name : {"Asia/Tokyo", "Asia", "UTC/", "/UTC", "../zoneinfo/UTC", "./UTC",
+                            "posix/UTC", "localtime", "out", "Nowhere/Here", "UTC UTC", "U\nTC"}) {
+    string shown = name;
+    std::replace(shown.begin(), shown.end(), '\n', '?');
+    EXPECT_EQ(set_zone(name), (report{"tzdata-set-zone: there is no zone " + shown, "exit 1"}));
+  }
+  for (const string wrong : {"", "-x"}) EXPECT_EQ(set_zone(wrong).back(), "exit 2");
+  EXPECT_EQ(set_zone("--version").back(), "exit 0");
+  EXPECT_EQ(look(), before);
+  lay_out(on_first + gone(zoneinfo));
+  EXPECT_EQ(set_zone("UTC").back(), "exit 2");
+}
+
 }  // namespace
