@@ -362,6 +362,33 @@ TEST_F(update_on_device, is_taken_again) {
   EXPECT_EQ(update_by(archive).back(), "exit 1");
 }
 
+// Where a call on a path fails. The sweep tells that the device is whole then; this, what is said.
+TEST_F(update_on_device, says_what_failed) {
+  const struct {
+    report tracing;
+    report says;
+    bool is_taken;
+  } rows[] = {
+      {{"-P", updates + ".part/.tzdata-update", "-e", "inject=write:error=ENOSPC"},
+       {"tzdata-update: " + updates + ".part/.tzdata-update: No space left on device", "exit 2"},
+       false},
+      {{"-P", latest + ".new", "-e", "inject=rename:error=EIO"},
+       {"tzdata-update: " + latest + ": Input/output error", "exit 2"},
+       false},
+      {{"-P", second, "-e", "inject=rename:error=EIO"},
+       report{"tzdata-update: 2020a.10.0 cannot be removed: " + second + ": Input/output error"} +
+           taking,
+       true},
+  };
+  for (const auto& [tracing, says, is_taken] : rows) {
+    lay_out(on_first + mark(second));
+    publish(published, good + tar_end);
+    const device before = look();
+    EXPECT_EQ(update_by(archive, tracing), says);
+    EXPECT_EQ(is_taken, look() != before);
+  }
+}
+
 TEST_F(update_on_device, makes_a_directory_everybodys_to_read_and_roots_to_change) {
   lay_out(on_first + update(third) + link_to(third + "/zoneinfo/link", "Asia/Tokyo"));
   files::permissions(third, files::perms(0700));

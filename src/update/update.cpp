@@ -80,7 +80,8 @@ void write_mark(int directory, const string& sum) {
   const string path = string(part_directory) + mark_file;
   olm_descriptor file(openat(directory, &mark_file[1],
                              O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, readable));
-  if (write(file.get(), sum.data(), sum.size()) != static_cast<ssize_t>(sum.size()) ||
+  if (!file.is_open() ||
+      write(file.get(), sum.data(), sum.size()) != static_cast<ssize_t>(sum.size()) ||
       file.close() != 0)
     fail(path);
 }
