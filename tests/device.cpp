@@ -173,6 +173,6 @@ report hear(const report& command) {
   return heard;
 }
 
-report ask(const report& arguments, const report& tracing) {
-  return hear(trace(tracing) + report{PROGRAMS "/tzdata-status"} + arguments);
+report ask(const report& arguments, const report& tracing, const std::string& program) {
+  return hear(trace(tracing) + report{PROGRAMS "/" + program} + arguments);
 }

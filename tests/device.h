@@ -67,8 +67,10 @@ report boot(const report& tracing = {});
 // Runs a command with an empty environment. Gives its lines.
 report hear(const report& command);
 
-// Asks the built tzdata-status, under strace if there are `tracing` options. Gives its lines.
-report ask(const report& arguments, const report& tracing = {});
+// Asks the built tzdata-status, or another program of that kind, under strace if there are
+// `tracing` options. Gives its lines.
+report ask(const report& arguments, const report& tracing = {},
+           const std::string& program = "tzdata-status");
 
 // What those two write while they run.
 inline const std::string output = "/var/output";

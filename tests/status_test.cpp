@@ -72,6 +72,11 @@ const std::vector<question> questions = {
      "exit 0",
      first + "/"},
 
+    {on_second + link_to(zoneinfo + ".boot", first + "/zoneinfo"),
+     {"Verdict: used", "Reason: a boot goes back to it"},
+     "exit 0",
+     first},
+
     // Halves that do not belong together
     {on_second + file(icutz, ""), in_use + mended},
     {on_second + folder(icutz), in_use + apart(second + "/zoneinfo", "a directory"), "exit 0"},
@@ -263,6 +268,9 @@ TEST(status, reports_to_people) {
   EXPECT_EQ(ask({"--root=" + first}).at(6), "next start  fails: none");
   lay_out(on_first + gone(latest) + file(version, "2020b"));
   EXPECT_EQ(ask({}).at(6), "next start  falls back to the system partition: " + system_zoneinfo);
+  lay_out(on_second + gone(latest) + link_to(zoneinfo + ".boot", first + "/zoneinfo"));
+  EXPECT_EQ(ask({}).at(6), "next start  goes back to 2020a.9.0: " + first + "/zoneinfo");
+  EXPECT_EQ(ask({}).at(7), "because     the zoneinfo link is first pointed back at");
   // Wherever a name of one word ends.
   lay_out(on_first + link_to(latest, updates + string(100, 'x')));
   EXPECT_EQ(ask({}).at(9), "            " + updates + string(100, 'x'));

@@ -1,12 +1,13 @@
-// Kills boots before each of their system calls on the device's files, and fails each such call.
+// Kills boots and updates before each of their system calls on the device's files, and fails each
+// such call.
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <cstdio>
 #include <fstream>
 
+#include "archives.h"
 #include "fs/file_operations.h"
-#include "starts.h"
 
 namespace {
 
@@ -32,10 +33,10 @@ device heal() {
 
 bool has(const std::string& in, const char* text) { return in.find(text) != std::string::npos; }
 
-// The calls on the device's files that a boot makes, as strace prints them, each with what strace
-// needs to find it again. No call closes what is not open.
-std::vector<std::pair<std::string, std::string>> trace_boot() {
-  boot({"-y", "-o", "/var/calls"});
+// The calls on the device's files that a program makes when `run` with options for strace, as that
+// prints them, each with what strace needs to find it again. No call closes what is not open.
+std::vector<std::pair<std::string, std::string>> trace_calls(report (*run)(const report&)) {
+  run({"-y", "-o", "/var/calls"});
   std::vector<std::pair<std::string, std::string>> calls;
   std::map<std::string, int> numbers;
   std::ifstream lines("/var/calls");
@@ -43,7 +44,8 @@ std::vector<std::pair<std::string, std::string>> trace_boot() {
     const std::string name = line.substr(0, line.find('('));
     const std::string number = std::to_string(++numbers[name]);
     EXPECT_FALSE(has(line, "EBADF")) << line;
-    if (line.starts_with("write(2")) continue;  // a warning about a file
+    // A warning about a file; and the program's own start, with a path among its arguments.
+    if (line.starts_with("write(2") || line.starts_with("execve(")) continue;
     if (has(line, "/var/db") || has(line, "/usr/share"))
       calls.emplace_back(line, "inject=" + name + ":when=" + number + ":");
   }
@@ -58,7 +60,7 @@ TEST_P(sweep, is_healed_by_the_next_boot) {
                                 [](const auto& one) { return one.name == GetParam(); });
   ASSERT_NE(row, starts.end());
   lay_out(row->before);
-  const auto calls = trace_boot();
+  const auto calls = trace_calls(boot);
   const device undisturbed = heal();
   std::map<std::string, int> found;
   for (const auto& [call, injection] : calls) {
@@ -92,5 +94,86 @@ INSTANTIATE_TEST_SUITE_P(
                     "an ICU link of earlier systems", "a zone among the system's own",
                     "a zone that only the update in use has",
                     "a zone and an ICU link that were lost, and what else kills leave"));
+
+const std::string published = "/var/2020b.1.0";
+const std::string third = at::updates + "2020b.1.0";
+
+struct update_sweep_case {
+  std::string name;
+  entries before;
+  report (*run)(const report& tracing);
+};
+
+template <const char*... words>
+report run_update(const report& tracing) {
+  return ask({words...}, tracing, "tzdata-update");
+}
+constexpr char archive_path[] = "/var/2020b.1.0.tar";
+constexpr char directory_path[] = "/var/db/timezone/tz/2020b.1.0";
+constexpr char back[] = "--back";
+
+const entries marked = file(first + "/.tzdata-update", "x") + file(second + "/.tzdata-update", "x");
+const std::vector<update_sweep_case> update_sweep_cases = {
+    {"archive", on_first + marked, run_update<archive_path>},
+    {"directory", on_first + marked + update(third), run_update<directory_path>},
+    {"back", on_second, run_update<back>},
+};
+
+class update_sweep : public testing::TestWithParam<std::string> {
+ protected:
+  void SetUp() override { make_program("tzdata-check", "exit 0"); }
+};
+
+// What a start would make the zoneinfo link.
+std::string find_next() { return ask({"--query"}).at(9); }
+
+// The next start is told of the update or it is not, and another run ends as if nothing had been.
+TEST_P(update_sweep, is_finished_by_the_next_one) {
+  const auto row = std::find_if(update_sweep_cases.begin(), update_sweep_cases.end(),
+                                [](const auto& one) { return one.name == GetParam(); });
+  const auto lay_out_anew = [&] {
+    lay_out(row->before);
+    publish(published, pack_all(good_update) + tar_end);
+  };
+  lay_out_anew();
+  const bool is_back = row->run == run_update<back>;
+  const std::string before = find_next();
+  const auto calls = trace_calls(row->run);
+  const std::string after = find_next();
+  EXPECT_NE(after, before);
+  const device undisturbed = look();
+  std::map<std::string, int> found;
+  std::map<std::string, int> seen;
+  for (const auto& [call, injection] : calls) {
+    // Forecasts look at the same things again and again. Nothing is lost with one of these looks.
+    if (seen[call.substr(0, call.rfind(" = "))]++ > 0) continue;
+    const bool is_look = call.starts_with("statx(") || call.starts_with("readlink(");
+    for (const std::string& what :
+         is_look ? report{"error=EIO"}
+                 : report{"error=EIO", "error=ENOSPC", "error=EROFS", "signal=KILL"}) {
+      SCOPED_TRACE(what + " at " + call);
+      lay_out_anew();
+      const std::string end = row->run({"-e", injection + what}).back();
+      const std::string next = find_next();
+      // Where it cannot be seen that the update before fits, the system partition is gone back to.
+      const bool is_other =
+          is_back && what != "signal=KILL" && next == "Next-Zoneinfo: " + at::system_zoneinfo;
+      EXPECT_TRUE(next == before || next == after || is_other) << next;
+      EXPECT_TRUE(end != "exit 0" || next != before || is_back);
+      if (what == "signal=KILL") {
+        ++found["kills of updates, all finished"];
+        EXPECT_EQ(end, "signal 9");
+      } else {
+        ++found["faults in updates, all finished"];
+        EXPECT_TRUE(end.starts_with("exit ")) << end;
+      }
+      EXPECT_EQ(row->run({}).back(), "exit 0");
+      EXPECT_TRUE(is_other || look() == undisturbed);
+    }
+  }
+  for (const auto& [what, times] : found) std::printf("sweep: %d %s\n", times, what.c_str());
+}
+
+INSTANTIATE_TEST_SUITE_P(update, update_sweep, testing::Values("archive", "directory", "back"));
 
 }  // namespace

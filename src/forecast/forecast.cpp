@@ -3,22 +3,23 @@
 #include <algorithm>
 
 #include "boot/boot.h"
-#include "dataset/olm_dataset.h"
 #include "dataset/olm_icu.h"
 #include "dataset/olm_zoneinfo.h"
 #include "driver/localtime.h"
 #include "driver/start.h"
+#include "fs/file_operations.h"
 
-start_forecast forecast_start(const std::string& latest) {
+start_forecast forecast_start(const suppositions& supposed) {
   start_forecast forecast;
-  olm_trial trial;
+  olm_trial trial(supposed);
   // What the links are is told even if a start could not see it.
   trial.go_by_rights_of_user(true);
   forecast.zoneinfo.now = trial.find(zoneinfo_link);
   forecast.icutz.now = trial.find(icutz_link);
   forecast.localtime.now = trial.find(localtime_link);
   forecast.fit_now = do_halves_fit();
-  if (!latest.empty()) trial.put_link(latest_link, latest);
+  forecast.restored = trial.find(fs::get_spare_path(zoneinfo_link)).target;
+  if (forecast.restored == forecast.zoneinfo.now.target) forecast.restored.clear();
   trial.go_by_rights_of_user(false);
   const int status = run_boot();
   trial.require_told();

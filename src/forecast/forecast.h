@@ -18,6 +18,8 @@ struct start_forecast {
   link_forecast zoneinfo;
   link_forecast icutz;
   link_forecast localtime;
+  // What a boot first points the zoneinfo link back at; empty where it leaves that alone.
+  std::string restored;
   bool installs = false;  // it takes the latest update into use
   bool fit_now = false;   // what do_halves_fit gives before and after it
   bool fit_next = false;
@@ -25,7 +27,7 @@ struct start_forecast {
   trial_record record;
 };
 
-// Forecasts the next start. `latest`, if not empty, stands for what tz_latest holds.
+// Forecasts the next start, with links as `supposed`.
 // Prints nothing. Throws std::runtime_error, with the reason as its text, when the outcome depends
 // on what the user of this program may not look at.
-[[nodiscard]] start_forecast forecast_start(const std::string& latest);
+[[nodiscard]] start_forecast forecast_start(const suppositions& supposed = {});

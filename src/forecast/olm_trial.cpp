@@ -62,12 +62,16 @@ olm_trial*& olm_trial::get_current() {
   return current;
 }
 
-olm_trial::olm_trial() {
+olm_trial::olm_trial(const suppositions& supposed) {
   get_current() = this;
   try {
+    is_for_user_ = true;
+    for (const supposed_link& link : supposed) suppose(link);
+    is_for_user_ = false;
     confine();
   } catch (const std::runtime_error&) {
   }  // whoever uses the trial hears of it
+  is_for_user_ = false;
   record_.obstacles.clear();
 }
 
@@ -210,9 +214,9 @@ void olm_trial::put(const std::string& place, mode_t type, const std::string& ta
   entry.status.stx_mode = static_cast<decltype(entry.status.stx_mode)>(type | ACCESSPERMS);
 }
 
-void olm_trial::put_link(const std::string& path, const std::string& target) {
-  const olm_entry entry = find(path);
-  if (!entry.place.empty()) put(entry.place, S_IFLNK, target);
+void olm_trial::suppose(const supposed_link& link) {
+  const olm_entry entry = find(link.path);
+  if (!entry.place.empty()) put(entry.place, link.target.empty() ? 0 : S_IFLNK, link.target);
 }
 
 // Why nothing can be written in the directory of `entry`, whatever the rights.

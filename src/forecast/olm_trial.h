@@ -28,6 +28,13 @@ struct olm_entry {
   [[nodiscard]] bool equals(const olm_entry& other) const;
 };
 
+// A link that a trial finds at `path` whatever stands there; with an empty target, none.
+struct supposed_link {
+  std::string path;
+  std::string target;
+};
+using suppositions = std::vector<supposed_link>;
+
 // What a trial has met.
 struct trial_record {
   std::vector<std::string> warnings;   // without the program's name and the text of errno
@@ -50,7 +57,7 @@ struct trial_record {
 // above, and in no other way but for want of memory.
 class olm_trial {
  public:
-  olm_trial();
+  explicit olm_trial(const suppositions& supposed = {});
   olm_trial(const olm_trial&) = delete;
   olm_trial& operator=(const olm_trial&) = delete;
   ~olm_trial();
@@ -61,9 +68,6 @@ class olm_trial {
   // The entries of `directory`, which may be a link, in its own order; none if it is missing or
   // closed to a boot.
   [[nodiscard]] std::vector<olm_entry> list(const std::string& directory);
-
-  // Puts a link to `target` in place of what stands at `path`.
-  void put_link(const std::string& path, const std::string& target);
 
   // Throws if the user of this program may not look at what the outcome depends on.
   void require_told() const;
@@ -93,6 +97,7 @@ class olm_trial {
   [[nodiscard]] olm_entry look_up_directory(const olm_entry& entry);
   [[nodiscard]] bool may(const olm_entry& entry, unsigned rights);
   void confine();
+  void suppose(const supposed_link& link);
   [[nodiscard]] bool is_allowed(const std::string& place, bool writes) const;
   [[nodiscard]] int refuse_writing(const olm_entry& entry);
   [[nodiscard]] int refuse_making(const olm_entry& entry);

@@ -12,8 +12,8 @@
 #include <utility>
 
 #include "answer/answer.h"
-#include "status/explain.h"
-#include "status/facts.h"
+#include "reasons/explain.h"
+#include "reasons/facts.h"
 
 namespace {
 
@@ -49,14 +49,6 @@ struct answer {
   sentences reasons;  // for what becomes of the latest update
 };
 
-// What becomes of `update`. Of a longer path, the start reads only the first bytes.
-const char* get_verdict(const device_facts& facts, const string& update) {
-  if (!facts.start.status) return "refused";
-  if (facts.start.installs) return facts.latest.path == update ? "used" : "refused";
-  const bool stays = get_parent(facts.start.zoneinfo.next.target) == update;
-  return stays && update.starts_with(update_area) ? "in-use" : "refused";
-}
-
 int get_status(const start_forecast& start) {
   const bool changes_nothing = start.zoneinfo.now.equals(start.zoneinfo.next) &&
                                start.icutz.now.equals(start.icutz.next) &&
@@ -66,20 +58,18 @@ int get_status(const start_forecast& start) {
 
 answer find_answer(const question& asked) {
   answer found;
-  found.facts = gather_facts(asked.update);
+  suppositions supposed;
+  if (!asked.update.empty()) supposed.push_back({latest_link, asked.update});
+  found.facts = gather_facts(supposed);
   found.because = explain_start(found.facts);
   found.remarks = list_remarks(found.facts);
   found.reasons = explain_latest(found.facts);
   found.status = get_status(found.facts.start);
   if (asked.update.empty()) return found;
-  found.verdict = get_verdict(found.facts, asked.update);
+  const update_verdict verdict = judge_update(found.facts, asked.update);
+  found.verdict = verdict.word;
+  found.reasons = verdict.reasons;
   found.status = found.verdict == "refused" ? EXIT_FAILURE : EXIT_SUCCESS;
-  if (found.verdict == "in-use") {
-    found.reasons = {"it is in use already, and stays so"};
-  } else if (found.facts.latest.path != asked.update) {
-    found.reasons = found.facts.start.record.obstacles;
-    found.reasons.emplace_back("a start cannot read that path from tz_latest");
-  }
   if (asked.had_slash) {
     found.reasons.emplace_back("the target of tz_latest must not end in a slash, as this path did");
   }

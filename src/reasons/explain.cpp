@@ -1,4 +1,4 @@
-#include "status/explain.h"
+#include "reasons/explain.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -25,11 +25,13 @@ string or_none(const string& text) { return text.empty() ? "none" : text; }
 
 // --- Data sets ---
 
-bool has_bad_link(const dataset_facts& current) { return !current.data && current.path.empty(); }
+bool has_bad_link(const device_facts& facts) {
+  return !facts.weighed.data && facts.weighed.path.empty();
+}
 
 // The data set that the latest update is compared with; null where it cannot be used.
 const olm_dataset* find_weighed(const device_facts& facts) {
-  const dataset_facts& weighed = has_bad_link(facts.current) ? facts.system : facts.current;
+  const dataset_facts& weighed = has_bad_link(facts) ? facts.system : facts.weighed;
   return weighed.data ? &*weighed.data : nullptr;
 }
 
@@ -41,7 +43,7 @@ sentences explain_problem(const string& what, const dataset_facts& facts) {
 
 // Why no file counts as the ICU data of an update.
 sentences explain_missing_schema(const dataset_facts& update) {
-  olm_trial trial;
+  olm_trial trial(update.supposed);
   if (!update.obstacles.empty()) return update.obstacles;
   const string directory = update.path + update_icu_directory;
   for (const string& needed : {update.path, directory}) {
@@ -84,7 +86,7 @@ sentences explain_refusal(const device_facts& facts, const olm_dataset& current)
   const olm_dataset& latest = *facts.latest.data;
   const olm_dataset& system = *facts.system.data;
   const string what = "the update " + latest.name;
-  const int error = olm_trial().find(latest.path, true).error;
+  const int error = olm_trial(facts.latest.supposed).find(latest.path, true).error;
   if (error == ENOENT || error == ENOTDIR) return {"there is no directory " + latest.path};
   if (latest.same_path(current)) {
     if (may_stay(current, system)) return {what + " is the current data set"};
@@ -186,6 +188,8 @@ string describe_start(const device_facts& facts) {
   if (!start.status) return "never ends";
   if (*start.status != EXIT_SUCCESS) return "fails";
   if (start.installs) return "installs " + (facts.latest.data ? facts.latest.data->name : "");
+  if (current != nullptr && start.zoneinfo.next.target == start.restored)
+    return "goes back to " + current->name;
   if (start.zoneinfo.next.is_new) return "falls back to the system partition";
   return "keeps " + (current != nullptr ? current->name : "");
 }
@@ -198,7 +202,7 @@ sentences explain_latest(const device_facts& facts) {
   if (facts.latest.path.empty() && facts.latest.problem.empty())
     return {"there is no latest update"};
   if (!facts.latest.data) return explain_problem("the latest update", facts.latest);
-  if (current == nullptr) return explain_problem("the current data set", facts.current);
+  if (current == nullptr) return explain_problem("the current data set", facts.weighed);
   const olm_dataset& latest = *facts.latest.data;
   if (!takes_over(latest, *current, *facts.system.data)) return explain_refusal(facts, *current);
 
@@ -208,9 +212,24 @@ sentences explain_latest(const device_facts& facts) {
   lines.push_back("the update " + latest.name + " is fit, and newer than the current data set " +
                   current->name);
   const string file = latest.path + update_zoneinfo_directory + version_file;
-  if (olm_trial().find(file, true).error == ENOENT)
+  if (olm_trial(facts.latest.supposed).find(file, true).error == ENOENT)
     lines.push_back("it has no " + file + ", which a start does not ask for");
   return lines;
+}
+
+update_verdict judge_update(const device_facts& facts, const string& update) {
+  const start_forecast& start = facts.start;
+  const bool is_next = start.status && update.starts_with(update_area) &&
+                       get_parent(start.zoneinfo.next.target) == update;
+  if (is_next && start.installs) return {"used", explain_latest(facts)};
+  if (is_next && get_parent(start.zoneinfo.now.target) == update)
+    return {"in-use", {"it is in use already, and stays so"}};
+  if (is_next) return {"used", {"a boot goes back to it"}};
+  if (facts.latest.path == update) return {"refused", explain_latest(facts)};
+  // Of a longer path, a start reads only the first bytes.
+  sentences reasons = start.record.obstacles;
+  reasons.emplace_back("a start cannot read that path from tz_latest");
+  return {"refused", reasons};
 }
 
 sentences explain_start(const device_facts& facts) {
@@ -219,13 +238,15 @@ sentences explain_start(const device_facts& facts) {
   if (start.status == EXIT_FAILURE) lines = start.record.obstacles;
   const bool stops_at_latest = facts.latest.path.empty() && !facts.latest.problem.empty();
   if (start.status && facts.system.data && !stops_at_latest) {
-    if (start.zoneinfo.now.error == ENOENT) {
+    if (!start.restored.empty()) {
+      lines.push_back("the zoneinfo link is first pointed back at " + start.restored);
+    } else if (start.zoneinfo.now.error == ENOENT) {
       lines.emplace_back("there is no zoneinfo link");
-    } else if (has_bad_link(facts.current)) {
+    } else if (has_bad_link(facts)) {
       lines.push_back("the zoneinfo link leads to no data set: " + describe(start.zoneinfo.now));
-    } else if (facts.current.data && !may_stay(*facts.current.data, *facts.system.data)) {
-      add_lines(lines, explain_current(facts.current, *facts.system.data));
     }
+    if (facts.weighed.data && !may_stay(*facts.weighed.data, *facts.system.data))
+      add_lines(lines, explain_current(facts.weighed, *facts.system.data));
   }
   add_lines(lines, explain_latest(facts));
   return lines;

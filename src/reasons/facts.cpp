@@ -1,4 +1,4 @@
-#include "status/facts.h"
+#include "reasons/facts.h"
 
 #include <algorithm>
 #include <cstring>
@@ -10,9 +10,11 @@
 namespace {
 
 // The data set at the path that `find_path` gives.
-dataset_facts gather_dataset(const std::function<std::string()>& find_path) {
-  olm_trial trial;
+dataset_facts gather_dataset(const suppositions& supposed,
+                             const std::function<std::string()>& find_path) {
+  olm_trial trial(supposed);
   dataset_facts facts;
+  facts.supposed = supposed;
   try {
     facts.path = find_path();
     facts.data.emplace(facts.path);
@@ -36,17 +38,18 @@ struct used_place {
   std::string state;  // of the update that holds it
 };
 
-std::vector<update_facts> gather_updates(const device_facts& facts, const std::string& latest) {
-  olm_trial trial;
+std::vector<update_facts> gather_updates(const device_facts& facts) {
+  olm_trial trial(facts.latest.supposed);
   trial.go_by_rights_of_user(true);
-  if (!latest.empty()) trial.put_link(latest_link, latest);
   const std::string current_path = get_parent(facts.start.zoneinfo.now.target);
-  const std::string next = facts.start.installs ? "waiting" : "refused";
+  const bool is_next = get_parent(facts.start.zoneinfo.next.target) == facts.latest.path;
+  const std::string next = is_next ? "waiting" : "refused";
   // The first that an update holds counts. Parts of one update may be links into another.
   std::vector<used_place> used = {{current_path, "current"}, {facts.latest.path, next}};
   for (const auto& [path, state] : {used_place{zoneinfo_link, "current"},
                                     {latest_link, next},
                                     {icutz_link, "current"},
+                                    {get_parent(facts.start.restored), "current"},
                                     {current_path + update_icu_directory, "current"},
                                     {facts.latest.path + update_icu_directory, next},
                                     {facts.latest.path + update_zoneinfo_directory, next}})
@@ -74,16 +77,16 @@ const std::string& get_schema(const olm_dataset& data) {
   return dynamic_cast<const olm_icu&>(*data.components.back()).schema;
 }
 
-device_facts gather_facts(const std::string& latest) {
+device_facts gather_facts(const suppositions& supposed) {
   device_facts facts;
-  facts.start = forecast_start(latest);
-  facts.system = gather_dataset([] { return std::string(); });
-  facts.current = gather_dataset(current_dataset_path);
-  facts.latest = gather_dataset([&] {
-    if (!latest.empty()) olm_trial::get().put_link(latest_link, latest);
-    return latest_dataset_path();
-  });
+  facts.start = forecast_start(supposed);
+  facts.system = gather_dataset(supposed, [] { return std::string(); });
+  facts.current = gather_dataset(supposed, current_dataset_path);
+  suppositions restored = supposed;
+  if (!facts.start.restored.empty()) restored.push_back({zoneinfo_link, facts.start.restored});
+  facts.weighed = gather_dataset(restored, current_dataset_path);
+  facts.latest = gather_dataset(supposed, latest_dataset_path);
   if (facts.latest.path.empty()) facts.latest.data.reset();
-  facts.updates = gather_updates(facts, latest);
+  facts.updates = gather_updates(facts);
   return facts;
 }

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "status/facts.h"
+#include "reasons/facts.h"
 
 // Several lines of words. The functions print nothing, and throw what gather_facts throws.
 using sentences = std::vector<std::string>;
@@ -20,6 +20,16 @@ using sentences = std::vector<std::string>;
 
 // Why the latest update is taken into use or not.
 [[nodiscard]] sentences explain_latest(const device_facts& facts);
+
+// What becomes of an update.
+struct update_verdict {
+  std::string word;  // used, in-use or refused
+  sentences reasons;
+};
+
+// What becomes of the update at the path `update`; `facts` are those with tz_latest as a link to
+// it.
+[[nodiscard]] update_verdict judge_update(const device_facts& facts, const std::string& update);
 
 // What is not as it should be on the device, and what the next start makes of it.
 [[nodiscard]] sentences list_remarks(const device_facts& facts);
