@@ -21,6 +21,9 @@ class olm_descriptor {
   // Closes now, for a caller that must know: 0, or -1 with errno set. Closed either way.
   [[nodiscard]] int close() { return ::close(std::exchange(descriptor_, -1)); }
 
+  // Gives it to another owner.
+  [[nodiscard]] int release() { return std::exchange(descriptor_, -1); }
+
  private:
   int descriptor_;
 };

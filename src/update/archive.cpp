@@ -13,6 +13,7 @@
 
 #include "fs/olm_descriptor.h"
 #include "update/failure.h"
+#include "update/steps.h"
 
 namespace {
 
@@ -138,27 +139,9 @@ off_t add_entry(const olm_header& header, off_t data, olm_contents& contents) {
   return size;
 }
 
-// What is made is never a link's target: no name leads through a link.
-olm_descriptor open_below(int directory, const string& name, int flags) {
-  constexpr mode_t readable = 0644;
-  const int opened = openat(directory, name.c_str(), flags | O_NOFOLLOW | O_CLOEXEC, readable);
-  if (opened == -1) fail(name);
-  return olm_descriptor(opened);
-}
-
-// Opens the directory in which `name` stands, step by step; `name` becomes the last step.
-olm_descriptor open_parent(int directory, string& name) {
-  const std::size_t slash = name.rfind('/');
-  if (slash == string::npos) return open_below(directory, ".", O_RDONLY | O_DIRECTORY);
-  string above = name.substr(0, slash);
-  name.erase(0, slash + 1);
-  const olm_descriptor parent = open_parent(directory, above);
-  return open_below(parent.get(), above, O_RDONLY | O_DIRECTORY);
-}
-
 void unpack_file(int archive, const update_entry& entry, int directory, const string& name) {
   constexpr std::size_t most_at_once = std::size_t{64} << 10U;
-  olm_descriptor file = open_below(directory, name, O_WRONLY | O_CREAT | O_EXCL);
+  olm_descriptor file = open_entry(directory, name, O_WRONLY | O_CREAT | O_EXCL);
   std::array<char, most_at_once> buffer{};
   for (off_t done = 0; done < entry.size;) {
     const auto left = static_cast<std::size_t>(entry.size - done);
@@ -171,27 +154,29 @@ void unpack_file(int archive, const update_entry& entry, int directory, const st
   if (file.close() != 0) fail(name);
 }
 
-void unpack_entry(int archive, const update_entry& entry, int root, string name) {
+void unpack_entry(int archive, const update_entry& entry, int root, const string& path) {
   constexpr mode_t open_to_all = 0755;
-  const olm_descriptor parent = open_parent(root, name);
-  string target = entry.target;
+  const auto directory = open_steps(root, get_directory(path));
+  const string name = get_name(path);
+  const string& target = entry.target;
   bool is_made = true;
   switch (entry.type) {
     case kind::directory:
-      is_made = mkdirat(parent.get(), name.c_str(), open_to_all) == 0;
+      is_made = mkdirat(directory->get(), name.c_str(), open_to_all) == 0;
       break;
     case kind::file:
-      unpack_file(archive, entry, parent.get(), name);
+      unpack_file(archive, entry, directory->get(), name);
       break;
     case kind::hard_link: {
-      const olm_descriptor other = open_parent(root, target);
-      is_made = linkat(other.get(), target.c_str(), parent.get(), name.c_str(), 0) == 0;
+      const auto other = open_steps(root, get_directory(target));
+      is_made =
+          linkat(other->get(), get_name(target).c_str(), directory->get(), name.c_str(), 0) == 0;
       break;
     }
     case kind::symbolic_link:
-      is_made = symlinkat(target.c_str(), parent.get(), name.c_str()) == 0;
+      is_made = symlinkat(target.c_str(), directory->get(), name.c_str()) == 0;
   }
-  if (!is_made) fail(name);
+  if (!is_made) fail(path);
 }
 
 }  // namespace

@@ -4,6 +4,7 @@
 
 #include "fs/file_operations.h"
 #include "update/failure.h"
+#include "update/steps.h"
 
 namespace {
 
@@ -14,12 +15,6 @@ constexpr std::size_t most_entries = 20'000;
 
 [[noreturn]] void refuse(const string& name, const string& reason) {
   throw olm_refusal({name + ' ' + reason});
-}
-
-// The directory that `name` stands in; empty for the update's own.
-string get_directory(const string& name) {
-  const std::size_t slash = name.rfind('/');
-  return slash == string::npos ? "" : name.substr(0, slash);
 }
 
 bool is_plain(const string& name) {

@@ -21,6 +21,7 @@
 #include "update/command.h"
 #include "update/failure.h"
 #include "update/olm_state.h"
+#include "update/steps.h"
 
 namespace {
 
@@ -31,8 +32,6 @@ namespace filesystem = std::filesystem;
 constexpr const char* mark_file = "/.tzdata-update";
 
 constexpr std::size_t sum_length = 64;
-
-string get_name(const string& path) { return path.substr(path.rfind('/') + 1); }
 
 std::optional<olm_version> read_version(const string& name) {
   const olm_trial trial;  // takes the warnings
