@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <optional>
@@ -74,6 +75,8 @@ const std::vector<zone_row> zones = {
     {"Before_February_Ends",
      "1 A STD/DST\nR A 2020 ma - F lastSu -25 1 S\nR A 2020 ma - N Su>=1 2 0 -", true},
     {"Year_Ends", "1 A STD/DST\nR A 2020 ma - D lastSu 2 1 S\nR A 2020 ma - Ja Su>=8 2 0 -"},
+    {"Across_Years",
+     "5:45:17 A STD/DST\nR A 1995 ma - D lastF 26:30 1 S\nR A 1995 ma - N Su>=8 14 0 -", true},
     {"One_Month", "1 A STD/DST\nR A 2020 ma - Mar Su>=1 2 1 S\nR A 2020 ma - Mar Su>=15 2 0 -"},
     {"One_Month_Without",
      "1 A STD/DST\nR A 2020 ma - Mar Su>=1 2 0 -\nR A 2020 ma - Mar Su>=15 2 1 S", true},
@@ -123,9 +126,37 @@ std::vector<std::pair<instant, std::pair<std::int32_t, bool>>> list_times(const 
   return times;
 }
 
+// Standard time's offset, as the source has it in a zone's last line.
+std::int32_t read_standard(const string& source) {
+  std::istringstream lines(source);
+  std::int32_t standard = 0;
+  for (string line; std::getline(lines, line);) {
+    if (line.starts_with("R ")) continue;
+    int hours = 0;
+    int minutes = 0;
+    int seconds = 0;
+    static_cast<void>(std::sscanf(line.c_str(), "%d:%d:%d", &hours, &minutes, &seconds));
+    standard = hours * 3600 + minutes * 60 + seconds;
+  }
+  return standard;
+}
+
+// The same as ICU has it at `when`.
+std::int32_t find_standard(const string& name, instant when) {
+  const std::unique_ptr<icu::TimeZone> zone(
+      icu::TimeZone::createTimeZone(icu::UnicodeString::fromUTF8(name)));
+  std::int32_t standard = 0;
+  std::int32_t saving = 0;
+  UErrorCode status = U_ZERO_ERROR;
+  zone->getOffset(static_cast<UDate>(when) * U_MILLIS_PER_SECOND, 0, standard, saving, status);
+  return standard / U_MILLIS_PER_SECOND;
+}
+
 TEST(make_test, gives_icu_the_same_times_for_ever) {
   std::ofstream(place + "tzdata.zi") << print_source();
   std::ofstream(place + "zone.tab") << "# codes\nNZ\t-4357-17633\tTest/South\n";
+  std::ofstream(place + "zone1970.tab")
+      << "AU,NZ\t-43-176\tTest/South\nIN,LK\t+22+88\tTest/Dates\n";
   ASSERT_EQ(make({place + "tzdata.zi"}), tell_success("2030b.1.0"));
   run("tar --extract --directory=made --file=made/2030b.1.0.tar");
   set_icu_directory(made + "icutz");
@@ -146,6 +177,8 @@ TEST(make_test, gives_icu_the_same_times_for_ever) {
     constexpr instant july = january + 15'638'400;
     if (row.dst) {
       EXPECT_EQ(*row.dst, std::pair(icu->find(january).is_dst, icu->find(july).is_dst));
+    } else {
+      EXPECT_EQ(find_standard("Test/" + row.name, july), read_standard(row.source));
     }
   }
   // A new name has the region of a table or of its target, and ICU's own names are the zones' whose
@@ -157,7 +190,7 @@ TEST(make_test, gives_icu_the_same_times_for_ever) {
     found += string(region.data()) + ' ' + std::to_string(icu::TimeZone::countEquivalentIDs(name)) +
              ", ";
   }
-  EXPECT_EQ(found, "NZ 4, NZ 4, 001 0, FR 4, FR 4, ");
+  EXPECT_EQ(found, "NZ 4, NZ 4, IN 0, FR 4, FR 4, ");
   std::filesystem::current_path("/");
 }
 
@@ -190,6 +223,10 @@ TEST(make_test, takes_a_release_or_says_why_not) {
        {"--number=2.10", archive},
        tell_success("2030c.2.10"),
        "cmp made/2030c.2.10.tar first/2030c.1.0.tar"},
+      {"cd ..; tar --create --gzip --file=release.tar.gz release",
+       {archive},
+       tell_success("2030c.1.0"),
+       "diff made first"},
       // Links of an archive lead to what is not the release's.
       {"ln -s /etc/passwd zone.tab; " + pack,
        {archive},
@@ -197,7 +234,7 @@ TEST(make_test, takes_a_release_or_says_why_not) {
        "diff made first"},
       {"rm asia; ln -s /etc/passwd asia; " + pack,
        {archive},
-       program + archive + " lacks a file, exit 1"},
+       program + archive + " has no file asia, exit 1"},
       {"echo 'BEGIN { system(\"touch /var/tmp/escaped\") }' >ziguard.awk",
        {place + "release"},
        program + "the release's ziguard.awk fails, exit 1",
@@ -209,10 +246,15 @@ TEST(make_test, takes_a_release_or_says_why_not) {
       {"echo master >version",
        {place + "release"},
        program + place + "release says that its release is: master, exit 1"},
+      {"printf '2030c\\nL x y' >version", {place + "release"}, "L x y, exit 1"},
       {"rm version",
        {place + "release"},
-       program + place + "release does not say which release it is, exit 1"},
-      {"rm northamerica", {place + "release"}, program + place + "release is no release, exit 1"},
+       program + place +
+           "release does not say which release it is: it has no file version, exit 1"},
+      {"rm northamerica",
+       {place + "release"},
+       program + place +
+           "release is no release: it has neither northamerica nor tzdata.zi, exit 1"},
       {"echo >../release.tar.gz", {archive}, program + archive + " cannot be unpacked, exit 1"},
       {"true", {place + "nothing"}, program + place + "nothing is not there, exit 1"},
       // Only an archive that is signed.
@@ -242,7 +284,10 @@ TEST(make_test, takes_a_release_or_says_why_not) {
        {"--base=" + place + "nothing", place + "release"},
        program + "ICU's files cannot be made, exit 1"},
       {"true",
-       {"--number=1", archive},
+       {"--number=01.0", archive},
+       program + "--number takes two numbers, such as 1.0, exit 1"},
+      {"true",
+       {"--keyring=", archive},
        "                          [--output=DIRECTORY] RELEASE, exit 2"},
       {"true",
        {"--base=x", "--icu=y", archive},

@@ -72,8 +72,10 @@ enum class told_by { wall_clocks = 0, standard_time = 1, utc = 2 };
 using icu_date = std::array<std::int32_t, 5>;
 
 // The date in a year at which all of `changes` are, which happen once a year, and a number of
-// seconds `ahead` of UTC. With `at_end`, midnight is the end of a day.
-std::optional<icu_date> fit_date(const std::vector<instant>& changes, instant ahead, bool at_end) {
+// seconds `ahead` of UTC. With `at_end`, midnight is the end of a day. ICU asks for the year by
+// clocks that show the offset `standard`.
+std::optional<icu_date> fit_date(const std::vector<instant>& changes, instant ahead,
+                                 instant standard, bool at_end) {
   const auto find_day = [&](instant change) {
     return chrono::floor<chrono::days>(
         chrono::sys_seconds(chrono::seconds(change + ahead - (at_end ? 1 : 0))));
@@ -92,7 +94,8 @@ std::optional<icu_date> fit_date(const std::vector<instant>& changes, instant ah
     const chrono::sys_days day = find_day(changes[i]);
     const chrono::year_month_day date = day;
     if (date.month() != first_date.month() ||
-        date.year() != first_date.year() + chrono::years(static_cast<int>(i)))
+        date.year() != first_date.year() + chrono::years(static_cast<int>(i)) ||
+        date.year() != get_date(changes[i] + standard).year())
       return {};
     earliest = std::min(earliest, get_day(date));
     latest = std::max(latest, get_day(date));
@@ -126,7 +129,7 @@ std::optional<icu_date> fit_date(const std::vector<instant>& changes, icu_time b
     for (const auto& [clocks, ahead] : {std::pair(told_by::wall_clocks, wall),
                                         std::pair(told_by::standard_time, instant{before.standard}),
                                         std::pair(told_by::utc, instant{0})}) {
-      auto date = fit_date(changes, ahead, at_end);
+      auto date = fit_date(changes, ahead, before.standard, at_end);
       if (!date || (at_end && date->at(3) != seconds_of_day)) continue;
       date->back() = static_cast<std::int32_t>(clocks);
       return date;

@@ -80,12 +80,16 @@ void add_own_zones(const icu_base& base, std::map<string, zone_entry>& zones) {
   }
 }
 
-// Gives each zone the region that the base has for it, or else the release.
+// Gives each zone the region that the base has for it. Where it has none, or knows the zone only as
+// one of nobody, the release may know.
 void set_regions(const icu_base& base, const std::map<string, release_zone>& release,
                  std::map<string, zone_entry>& zones) {
   for (auto& [name, zone] : zones) {
     const auto known = base.regions.find(name);
-    zone.region = known != base.regions.end() ? known->second : release.at(name).region;
+    if (known != base.regions.end()) zone.region = known->second;
+    const auto found = release.find(name);
+    if ((zone.region.empty() || zone.region == nowhere) && found != release.end())
+      zone.region = found->second.region;
     if (zone.region.empty()) zone.region = nowhere;
   }
 }
