@@ -16,7 +16,7 @@ struct tar_entry {
   std::string data{};    // a link's target
   std::string size{};    // what the header has as the size, if not that of the data
   std::string prefix{};  // what belongs before the name
-  char sum = 0;          // added to the header's sum
+  unsigned sum = 0;      // added to the header's sum
   std::string magic = std::string("ustar\00000", 8);
 };
 using tar_entries = std::vector<tar_entry>;
@@ -29,7 +29,7 @@ inline std::string pack(const tar_entry& entry) {
   };
   const auto to_octal = [](std::size_t number) {
     std::array<char, 12> text{};
-    std::snprintf(text.data(), text.size(), "%011zo", number);
+    static_cast<void>(std::snprintf(text.data(), text.size(), "%011zo", number));
     return std::string(text.data());
   };
   put(0, entry.name);
@@ -39,7 +39,7 @@ inline std::string pack(const tar_entry& entry) {
   if (!is_file) put(157, entry.data);
   put(257, entry.magic);
   put(345, entry.prefix);
-  std::size_t sum = static_cast<std::size_t>(entry.sum);
+  std::size_t sum = entry.sum;
   for (const char byte : header) sum += static_cast<unsigned char>(byte);
   put(148, to_octal(sum).substr(5) + '\0');
   if (!is_file) return header;

@@ -81,8 +81,9 @@ olm_contents adopt(const string& update) {
     directories.pop_back();
     const auto directory = open_steps(root.get(), path);
     protect(*directory, open_to_all, path);
+    const string prefix = path.empty() ? path : path + '/';
     for (const string& name : list_names(*directory, path)) {
-      const string entry_path = path.empty() ? name : path + '/' + name;
+      const string entry_path = prefix + name;
       const update_entry entry = adopt_entry(directory->get(), name, entry_path);
       contents.add(entry_path, entry);
       if (entry.type == kind::directory) directories.push_back(entry_path);

@@ -20,17 +20,17 @@ namespace filesystem = std::filesystem;
 
 constexpr const char* new_link = "/var/db/timezone/tz_latest.new";
 
-void sync_directory(const olm_descriptor& directory, const char* path) {
-  if (fsync(directory.get()) != 0) fail(path);
-}
-
-}  // namespace
-
 olm_descriptor open_directory(const string& path) {
   const int opened = open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
   if (opened == -1) fail(path);
   return olm_descriptor(opened);
 }
+
+void sync_directory(const olm_descriptor& directory, const char* path) {
+  if (fsync(directory.get()) != 0) fail(path);
+}
+
+}  // namespace
 
 void sync_all(const string& directory) {
   if (syncfs(open_directory(directory).get()) != 0) fail(directory);
@@ -53,18 +53,18 @@ olm_state::~olm_state() {
   filesystem::remove(new_link, failure);
 }
 
-olm_descriptor olm_state::make_part() const {
+olm_descriptor make_part() {
   constexpr mode_t open_to_all = 0755;
   if (mkdir(part_directory, open_to_all) != 0) fail(part_directory);
   return open_directory(part_directory);
 }
 
-void olm_state::put_in_place(const string& update) const {
+void put_in_place(const string& update) {
   if (std::rename(part_directory, update.c_str()) != 0) fail(update);
 }
 
 // Under its own name, a part of it would be taken for the whole.
-void olm_state::remove_update(const string& update) const {
+void remove_update(const string& update) {
   if (std::rename(update.c_str(), part_directory) != 0) fail(update);
   filesystem::remove_all(part_directory);
 }

@@ -16,15 +16,6 @@ class olm_state {
   olm_state& operator=(const olm_state&) = delete;
   ~olm_state();
 
-  // An empty directory for a new update, aside.
-  [[nodiscard]] olm_descriptor make_part() const;
-
-  // Gives that directory its name, `update`.
-  void put_in_place(const std::string& update) const;
-
-  // Removes the directory `update`, be it ever so large.
-  void remove_update(const std::string& update) const;
-
   // Makes `path`, in the state's directory, a link to `target`, in place of what is there, once the
   // names of all updates are on the disk. With an empty target, removes it.
   void set_link(const std::string& path, const std::string& target) const;
@@ -37,12 +28,20 @@ class olm_state {
   olm_descriptor updates_;
 };
 
-// Where the new update stands until it has its name.
+// The rest is for whoever has that object. It throws std::system_error where it fails, and prints
+// nothing.
+
+// Where a new update stands until it has its name.
 inline constexpr const char* part_directory = "/var/db/timezone/tz/.part";
 
-// The directory `path`, opened. Throws std::system_error where that fails, and prints nothing.
-[[nodiscard]] olm_descriptor open_directory(const std::string& path);
+// Makes that directory, which is empty then.
+[[nodiscard]] olm_descriptor make_part();
 
-// Sees that all that changed in the file system of `directory` is on the disk. Throws
-// std::system_error where that fails, and prints nothing.
+// Gives that directory its name, `update`.
+void put_in_place(const std::string& update);
+
+// Removes the directory `update`, be it ever so large.
+void remove_update(const std::string& update);
+
+// Sees that all that changed in the file system of `directory` is on the disk.
 void sync_all(const std::string& directory);

@@ -29,7 +29,7 @@ using std::string;
 namespace filesystem = std::filesystem;
 
 // In an update that was unpacked here, the sum of its archive. Others are never removed.
-constexpr const char* mark_file = "/.tzdata-update";
+constexpr const char* mark_name = ".tzdata-update";
 
 constexpr std::size_t sum_length = 64;
 
@@ -68,7 +68,7 @@ string read_sum(const string& path) {
 
 // The same of an update's mark; empty where there is none.
 string read_mark(const string& update) {
-  const string path = update + mark_file;
+  const string path = update + '/' + mark_name;
   const bool is_there = filesystem::is_directory(filesystem::symlink_status(update)) &&
                         filesystem::is_regular_file(filesystem::symlink_status(path));
   return is_there ? read_sum(path) : "";
@@ -76,9 +76,9 @@ string read_mark(const string& update) {
 
 void write_mark(int directory, const string& sum) {
   constexpr mode_t readable = 0644;
-  const string path = string(part_directory) + mark_file;
-  olm_descriptor file(openat(directory, &mark_file[1],
-                             O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, readable));
+  const string path = string(part_directory) + '/' + mark_name;
+  olm_descriptor file(
+      openat(directory, mark_name, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, readable));
   if (!file.is_open() ||
       write(file.get(), sum.data(), sum.size()) != static_cast<ssize_t>(sum.size()) ||
       file.close() != 0)
@@ -91,7 +91,7 @@ string describe_end(const command_result& result) {
 
 // Gives the archive's sum.
 string require_sum(const olm_descriptor& archive, const string& sum_path) {
-  const string sum = read_sum(sum_path);
+  string sum = read_sum(sum_path);
   const auto counted = run_command({"sha256sum"}, archive.get());
   if (!counted) throw std::runtime_error("there is no sha256sum");
   if (counted->status != 0) throw std::runtime_error("sha256sum fails: " + describe_end(*counted));
@@ -147,7 +147,7 @@ bool is_known(const olm_entry& link) {
 }
 
 // Removes what was not needed after the switch, neither by the forecast nor now.
-void remove_unused(const olm_state& state, const device_facts& forecast) {
+void remove_unused(const device_facts& forecast) {
   const device_facts facts = gather_facts();
   if (!is_known(facts.start.zoneinfo.now) || !is_known(facts.start.icutz.now)) return;
   for (const update_facts& update : facts.updates) {
@@ -155,7 +155,7 @@ void remove_unused(const olm_state& state, const device_facts& forecast) {
     const bool is_needed = !is_unused(facts, update.name) || !is_unused(forecast, update.name);
     if (is_needed || !read_version(update.name)) continue;
     try {
-      if (!read_mark(path).empty()) state.remove_update(path);
+      if (!read_mark(path).empty()) remove_update(path);
     } catch (const std::exception& failure) {
       warnx("%s cannot be removed: %s", update.name.c_str(), failure.what());
     }
@@ -176,9 +176,10 @@ string switch_to(const olm_state& state, const string& update, const string& pla
   if (verdict.word == "refused")
     reasons.insert(reasons.end(), verdict.reasons.begin(), verdict.reasons.end());
   // The start after the next one would give it up.
-  if (facts.system.data && facts.latest.data && *facts.system.data > *facts.latest.data)
+  if (facts.system.data && facts.latest.data && *facts.system.data > *facts.latest.data) {
     reasons.push_back(get_name(update) + " is older than the system partition " +
                       facts.system.data->name);
+  }
   if (!allows_older) {
     const sentences waiting = explain_waiting(now, update);
     reasons.insert(reasons.end(), waiting.begin(), waiting.end());
@@ -187,15 +188,15 @@ string switch_to(const olm_state& state, const string& update, const string& pla
   warn_of_zone(facts.start, update);
 
   sync_all(place);
-  if (place != update) state.put_in_place(update);
+  if (place != update) put_in_place(update);
   try {
     state.set_link(latest_link, update);
   } catch (...) {
-    if (place != update) state.remove_update(update);
+    if (place != update) remove_update(update);
     throw;
   }
   state.sync_links();
-  remove_unused(state, facts);
+  remove_unused(facts);
   return describe_next(facts.start);
 }
 
@@ -213,6 +214,7 @@ std::vector<string> list_before(const device_facts& facts) {
   std::sort(updates.begin(), updates.end(),
             [](const auto& one, const auto& other) { return one.first > other.first; });
   std::vector<string> paths;
+  paths.reserve(updates.size() + 1);
   for (const auto& [version, path] : updates) paths.push_back(path);
   paths.emplace_back();
   return paths;
@@ -234,7 +236,7 @@ string take_archive(const string& archive, bool allows_older) {
       throw olm_refusal({update + " is there already, and was not made from this archive"});
     return switch_to(state, update, update, allows_older);
   }
-  const olm_descriptor part = state.make_part();
+  const olm_descriptor part = make_part();
   unpack(file.get(), contents, part.get());
   write_mark(part.get(), sum);
   return switch_to(state, update, part_directory, allows_older);
