@@ -22,11 +22,6 @@ namespace chrono = std::chrono;
 constexpr int last_year = 2100;
 constexpr int first_year_of_own_zones = 1970;
 
-instant find_begin(int year) {
-  const chrono::sys_seconds begin = chrono::sys_days(chrono::year(year) / chrono::January / 1);
-  return begin.time_since_epoch().count();
-}
-
 string print_date(instant when) {
   const auto day = chrono::floor<chrono::days>(chrono::sys_seconds(chrono::seconds(when)));
   const chrono::year_month_day date(day);

@@ -1,11 +1,19 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <string>
 #include <vector>
 
 // Seconds since 1970-01-01 00:00 UTC, without leap seconds.
 using instant = std::int64_t;
+
+// The beginning of `year`, which is within those that std::chrono knows.
+[[nodiscard]] inline instant find_begin(int year) {
+  const std::chrono::sys_seconds begin =
+      std::chrono::sys_days(std::chrono::year(year) / std::chrono::January / 1);
+  return begin.time_since_epoch().count();
+}
 
 // What clocks show.
 struct local_time {

@@ -17,12 +17,6 @@ constexpr instant seconds_of_cycle = 146097 * seconds_of_day;
 // In 1494, when no clock followed a zone.
 constexpr instant long_ago = -15'000'000'000;
 
-instant find_begin(int year) {
-  return chrono::sys_seconds(chrono::sys_days(chrono::year(year) / chrono::January / 1))
-      .time_since_epoch()
-      .count();
-}
-
 chrono::year_month_day get_date(instant when) {
   return chrono::floor<chrono::days>(chrono::sys_seconds(chrono::seconds(when)));
 }
