@@ -3,6 +3,7 @@
 
 #include <sys/mount.h>
 
+#include <array>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>

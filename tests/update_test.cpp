@@ -5,6 +5,10 @@
 #include <sys/mount.h>
 #include <sys/stat.h>
 
+#include <algorithm>
+#include <fstream>
+#include <functional>
+
 #include "archives.h"
 #include "fs/olm_descriptor.h"
 

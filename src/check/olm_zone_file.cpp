@@ -1,6 +1,7 @@
 #include "check/olm_zone_file.h"
 
 #include <algorithm>
+#include <array>
 #include <limits>
 #include <stdexcept>
 #include <string>
