@@ -368,29 +368,38 @@ TEST_F(update_on_device, is_taken_again) {
 
 // Where a call on a path fails. The sweep tells that the device is whole then; this, what is said.
 TEST_F(update_on_device, says_what_failed) {
-  const struct {
-    report tracing;
-    report says;
-    bool is_taken;
-  } rows[] = {
-      {{"-P", updates + ".part/.tzdata-update", "-e", "inject=write:error=ENOSPC"},
-       {"tzdata-update: " + updates + ".part/.tzdata-update: No space left on device", "exit 2"},
-       false},
-      {{"-P", latest + ".new", "-e", "inject=rename:error=EIO"},
-       {"tzdata-update: " + latest + ": Input/output error", "exit 2"},
-       false},
-      {{"-P", second, "-e", "inject=rename:error=EIO"},
-       report{"tzdata-update: 2020a.10.0 cannot be removed: " + second + ": Input/output error"} +
-           taking,
-       true},
-  };
-  for (const auto& [tracing, says, is_taken] : rows) {
+  const string part = updates + ".part";
+  // The call that fails, a path to tell it from others, and what is named.
+  const std::array<string, 3> rows[] = {
+      {"pipe2", "", "sha256sum"},
+      {"flock", "", base},
+      {"mkdir", "", part},
+      {"mkdirat", "", "icutz"},
+      {"pread64", "", "the archive"},
+      {"write", part + "/zoneinfo/+VERSION", "+VERSION"},
+      {"write", part + "/.tzdata-update", part + "/.tzdata-update"},
+      {"syncfs", "", part},
+      {"rename", part, third},
+      {"fsync", "", updates},
+      {"symlink", "", latest + ".new"},
+      {"rename", latest + ".new", latest}};
+  const auto run_on_device = [&](const report& tracing) {
     lay_out(on_first + mark(second));
     publish(published, good + tar_end);
-    const device before = look();
-    EXPECT_EQ(update_by(archive, tracing), says);
-    EXPECT_EQ(is_taken, look() != before);
+    return update_by(archive, tracing);
+  };
+  run_on_device({"-e", "inject=geteuid:retval=1000"});
+  const device before = look();
+  for (const auto& [call, path, named] : rows) {
+    const report only = path.empty() ? report{} : report{"-P", path};
+    EXPECT_EQ(run_on_device(only + report{"-e", "inject=" + call + ":error=EIO"}),
+              (report{"tzdata-update: " + named + ": Input/output error", "exit 2"}));
+    EXPECT_EQ(look(), before) << call;
   }
+  EXPECT_EQ(
+      run_on_device({"-P", second, "-e", "inject=rename:error=EIO"}),
+      report{"tzdata-update: 2020a.10.0 cannot be removed: " + second + ": Input/output error"} +
+          taking);
 }
 
 TEST_F(update_on_device, makes_a_directory_everybodys_to_read_and_roots_to_change) {
