@@ -150,8 +150,9 @@ TEST_P(update_sweep, is_finished_by_the_next_one) {
     if (seen[call.substr(0, call.rfind(" = "))]++ > 0) continue;
     const std::array looks = {"statx(", "newfstatat(", "statfs(", "readlink(",
                               "read(",  "getdents64(", "close("};
-    const bool is_look = std::any_of(looks.begin(), looks.end(),
-                                     [&](const char* name) { return call.starts_with(name); });
+    const bool is_look = std::any_of(looks.begin(), looks.end(), [&line = call](const char* name) {
+      return line.starts_with(name);
+    });
     for (const std::string& what :
          is_look ? report{"error=EIO"}
                  : report{"error=EIO", "error=ENOSPC", "error=EROFS", "signal=KILL"}) {
