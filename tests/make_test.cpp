@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <memory>
@@ -133,10 +132,12 @@ std::int32_t read_standard(const string& source) {
   std::int32_t standard = 0;
   for (string line; std::getline(lines, line);) {
     if (line.starts_with("R ")) continue;
+    string offset = line.substr(0, line.find(' '));
+    std::replace(offset.begin(), offset.end(), ':', ' ');
     int hours = 0;
     int minutes = 0;
     int seconds = 0;
-    static_cast<void>(std::sscanf(line.c_str(), "%d:%d:%d", &hours, &minutes, &seconds));
+    std::istringstream(offset) >> hours >> minutes >> seconds;
     standard = hours * 3600 + minutes * 60 + seconds;
   }
   return standard;
