@@ -287,7 +287,7 @@ TEST(make_test, takes_a_release_or_says_why_not) {
        program + "ICU's files cannot be made, exit 1"},
       {"true",
        {"--number=01.0", archive},
-       program + "--number takes two numbers, such as 1.0, exit 1"},
+       program + "--number takes two numbers, such as 1.0, exit 2"},
       {"true",
        {"--keyring=", archive},
        "                          [--output=DIRECTORY] RELEASE, exit 2"},

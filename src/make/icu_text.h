@@ -30,10 +30,12 @@ struct zone_entry {
   std::string region;
 };
 
-// The text of what `zone` has. Its rule, if it has one, is added to `rules`.
+// The text of what `zone` has. Its rule, if it has one, is added to `rules`. Prints and throws
+// nothing.
 [[nodiscard]] std::string print_zone(const icu_zone& zone, std::vector<icu_rule>& rules);
 
-// The text of zoneinfo64, which has all `zones` by their names. Each target is among them.
+// The text of zoneinfo64, which has all `zones` by their names. Each target is among them. Prints
+// nothing.
 [[nodiscard]] std::string print_zones(const std::string& release,
                                       const std::map<std::string, zone_entry>& zones,
                                       const std::vector<icu_rule>& rules,
