@@ -371,11 +371,11 @@ TEST_F(update_on_device, says_what_failed) {
   const string part = updates + ".part";
   // The call that fails, a path to tell it from others, and what is named.
   const std::array<string, 3> rows[] = {
-      {"pipe2", "", "sha256sum"},
+      {"clone,clone3", "", "sha256sum"},
       {"flock", "", base},
       {"mkdir", "", part},
       {"mkdirat", "", "icutz"},
-      {"pread64", "", "the archive"},
+      {"pread64", published + ".tar", "the archive"},
       {"write", part + "/zoneinfo/+VERSION", "+VERSION"},
       {"write", part + "/.tzdata-update", part + "/.tzdata-update"},
       {"syncfs", "", part},
