@@ -94,7 +94,7 @@ bad_archive add_type(char type) {
 }
 bad_archive add_link(const string& target) {
   return add({{"zoneinfo/x", '2', target}},
-             "zoneinfo/x is a link to " + target + ", which is not in the update");
+             "zoneinfo/x is a link to " + target + ", which leads to nothing in the update");
 }
 bad_archive add_name(const string& name) {
   string shown = name;
@@ -134,6 +134,7 @@ const std::vector<bad_archive> bad_archives = {
     add_link("../.."),
     add_link("Asia/"),
     add_link("nothing"),
+    add_link("x"),
     add_link(""),
     add({{"zoneinfo/x", '1', "/etc/passwd"}},
         "zoneinfo/x is a link to /etc/passwd, which is no file before it"),
@@ -242,12 +243,17 @@ const std::vector<device_update> device_updates = {
      link_to(latest, third) + gone(second)},
     {on_first + update(third) + link_to(third + "/icutz/x", "/etc/passwd"),
      {third},
-     {"icutz/x is a link to /etc/passwd, which is not in the update", "exit 1"}},
+     {"icutz/x is a link to /etc/passwd, which leads to nothing in the update", "exit 1"}},
     {on_first + update(third),
      {third},
      {"zoneinfo/socket is no file, directory or link", "exit 1"},
      {},
      [] { EXPECT_EQ(mknod((third + "/zoneinfo/socket").c_str(), S_IFSOCK, 0), 0); }},
+    {on_first + update(third) + file(base + "other", "x"),
+     {third},
+     {"zoneinfo/x has another name outside the update", "exit 1"},
+     {},
+     [] { files::create_hard_link(base + "other", third + "/zoneinfo/x"); }},
     {on_first + folder(updates + "part"),
      {updates + "part"},
      {"part is no version such as 2026a.1.0", "exit 1"}},
@@ -294,7 +300,7 @@ const std::vector<device_update> device_updates = {
      gone(latest) + link_to(spare, system_zoneinfo),
      [] {},
      system_links + gone(spare)},
-    {on_second + file(version, "2020a"),
+    {on_second + file(version, "2020a") + file(second + "/zoneinfo/+VERSION", "damaged"),
      {"--back"},
      {"the next start uses 2020a.9.0", "exit 0"},
      link_to(latest, first) + link_to(spare, first + "/zoneinfo")},
@@ -374,9 +380,9 @@ TEST_F(update_on_device, says_what_failed) {
       {"clone,clone3", "", "sha256sum"},
       {"flock", "", base},
       {"mkdir", "", part},
-      {"mkdirat", "", "icutz"},
+      {"mkdirat", "", part + "/icutz"},
       {"pread64", published + ".tar", "the archive"},
-      {"write", part + "/zoneinfo/+VERSION", "+VERSION"},
+      {"write", part + "/zoneinfo/+VERSION", part + "/zoneinfo/+VERSION"},
       {"write", part + "/.tzdata-update", part + "/.tzdata-update"},
       {"syncfs", "", part},
       {"rename", part, third},
@@ -430,6 +436,11 @@ TEST_F(update_on_device, asks_the_checker) {
   make_program("tzdata-check", "kill -9 $$");
   EXPECT_EQ(update_by(archive),
             (report{"tzdata-update: tzdata-check cannot tell: status 137", "exit 2"}));
+  // One that cannot run is not as good as none.
+  make_program("tzdata-check", "");
+  std::ofstream("/usr/local/bin/tzdata-check") << "#!/nowhere";
+  EXPECT_EQ(update_by(archive),
+            (report{"tzdata-update: tzdata-check: No such file or directory", "exit 2"}));
   EXPECT_EQ(look(), before);
   make_program("tzdata-check", "exit 0");
   EXPECT_EQ(update_by(archive), taking);

@@ -7,11 +7,14 @@
 
 #include <array>
 #include <climits>
+#include <map>
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "fs/olm_descriptor.h"
 #include "update/failure.h"
+#include "update/olm_contents.h"
 #include "update/steps.h"
 
 namespace {
@@ -23,7 +26,6 @@ struct directory_closer {
   void operator()(DIR* directory) const { closedir(directory); }
 };
 
-// `path` is for messages.
 void protect(const olm_descriptor& opened, mode_t mode, const string& path) {
   if (fchown(opened.get(), 0, 0) != 0 || fchmod(opened.get(), mode) != 0) fail(path);
 }
@@ -35,10 +37,10 @@ string read_target(int directory, const string& name, const string& path) {
   return {target.data(), static_cast<std::size_t>(length)};
 }
 
-std::vector<string> list_names(const olm_descriptor& directory, const string& path) {
-  const int listed = open_entry(directory.get(), ".", O_RDONLY | O_DIRECTORY).release();
+std::vector<string> list_names(const olm_directory& directory) {
+  const int listed = open_entry(directory, ".", O_RDONLY | O_DIRECTORY).release();
   const std::unique_ptr<DIR, directory_closer> names(fdopendir(listed));
-  if (!names) fail(path);
+  if (!names) fail(directory.path);
   const auto read_next = [&] {
     errno = 0;
     return readdir(names.get());
@@ -48,47 +50,71 @@ std::vector<string> list_names(const olm_descriptor& directory, const string& pa
     const string name = &next->d_name[0];
     if (name != "." && name != "..") found.push_back(name);
   }
-  if (errno != 0) fail(path);
+  if (errno != 0) fail(directory.path);
   return found;
 }
 
-// Gives what it is.
-update_entry adopt_entry(int directory, const string& name, const string& path) {
-  constexpr mode_t readable = 0644;
+// The files of an update, by what they are on the disk.
+struct update_file {
+  nlink_t names = 0;          // in all directories
+  std::vector<string> paths;  // in the update
+};
+using update_files = std::map<std::pair<dev_t, ino_t>, update_file>;
+
+// Gives what the entry `name` is, whose path in the update is `path`. A file is noted in `files`.
+update_entry adopt_entry(const olm_directory& directory, const string& name, const string& path,
+                         update_files& files) {
+  const int opened = directory.opened.get();
+  const string whole_path = directory.path + '/' + name;
   struct stat status {};
-  if (fstatat(directory, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) fail(path);
+  if (fstatat(opened, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) fail(whole_path);
   if (S_ISDIR(status.st_mode)) return {.type = kind::directory};
   if (S_ISREG(status.st_mode)) {
-    protect(open_entry(directory, name, O_RDONLY), readable, path);
+    update_file& file = files[{status.st_dev, status.st_ino}];
+    file.names = status.st_nlink;
+    file.paths.push_back(path);
     return {.type = kind::file};
   }
   if (!S_ISLNK(status.st_mode)) throw olm_refusal({path + " is no file, directory or link"});
-  if (fchownat(directory, name.c_str(), 0, 0, AT_SYMLINK_NOFOLLOW) != 0) fail(path);
-  return {.type = kind::symbolic_link, .target = read_target(directory, name, path)};
+  if (fchownat(opened, name.c_str(), 0, 0, AT_SYMLINK_NOFOLLOW) != 0) fail(whole_path);
+  return {.type = kind::symbolic_link, .target = read_target(opened, name, whole_path)};
+}
+
+// Changes no file that also stands elsewhere.
+void adopt_files(const olm_directory& top, const update_files& files) {
+  constexpr mode_t readable = 0644;
+  for (const auto& [id, file] : files) {
+    const string& path = file.paths.front();
+    if (file.names != file.paths.size())
+      throw olm_refusal({path + " has another name outside the update"});
+    const olm_directory directory = open_steps(top, get_directory(path));
+    protect(open_entry(directory, get_name(path), O_RDONLY), readable, top.path + '/' + path);
+  }
 }
 
 }  // namespace
 
-olm_contents adopt(const string& update) {
+void adopt(const string& update) {
   constexpr mode_t open_to_all = 0755;
-  const olm_descriptor root = open_entry(AT_FDCWD, update, O_RDONLY | O_DIRECTORY);
+  const olm_directory top = open_top(update);
   olm_contents contents;
+  update_files files;
   // Each directory is protected before anything in it is looked at, so that nobody else can change
   // that meanwhile.
   std::vector<string> directories = {""};
   while (!directories.empty()) {
     const string path = directories.back();
     directories.pop_back();
-    const auto directory = open_steps(root.get(), path);
-    protect(*directory, open_to_all, path);
+    const olm_directory directory = open_steps(top, path);
+    protect(directory.opened, open_to_all, directory.path);
     const string prefix = path.empty() ? path : path + '/';
-    for (const string& name : list_names(*directory, path)) {
+    for (const string& name : list_names(directory)) {
       const string entry_path = prefix + name;
-      const update_entry entry = adopt_entry(directory->get(), name, entry_path);
+      const update_entry entry = adopt_entry(directory, name, entry_path, files);
       contents.add(entry_path, entry);
       if (entry.type == kind::directory) directories.push_back(entry_path);
     }
   }
   contents.require_whole();
-  return contents;
+  adopt_files(top, files);
 }

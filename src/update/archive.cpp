@@ -139,8 +139,10 @@ off_t add_entry(const olm_header& header, off_t data, olm_contents& contents) {
   return size;
 }
 
-void unpack_file(int archive, const update_entry& entry, int directory, const string& name) {
+void unpack_file(int archive, const update_entry& entry, const olm_directory& directory,
+                 const string& name) {
   constexpr std::size_t most_at_once = std::size_t{64} << 10U;
+  const string path = directory.path + '/' + name;
   olm_descriptor file = open_entry(directory, name, O_WRONLY | O_CREAT | O_EXCL);
   std::array<char, most_at_once> buffer{};
   for (off_t done = 0; done < entry.size;) {
@@ -148,35 +150,36 @@ void unpack_file(int archive, const update_entry& entry, int directory, const st
     const auto part = std::span(buffer).first(std::min(left, buffer.size()));
     read_fully(archive, entry.begin + done, part);
     const ssize_t written = write(file.get(), part.data(), part.size());
-    if (written < 0) fail(name);
+    if (written < 0) fail(path);
     done += written;
   }
-  if (file.close() != 0) fail(name);
+  if (file.close() != 0) fail(path);
 }
 
-void unpack_entry(int archive, const update_entry& entry, int root, const string& path) {
+void unpack_entry(int archive, const update_entry& entry, const olm_directory& top,
+                  const string& path) {
   constexpr mode_t open_to_all = 0755;
-  const auto directory = open_steps(root, get_directory(path));
+  const olm_directory directory = open_steps(top, get_directory(path));
+  const int opened = directory.opened.get();
   const string name = get_name(path);
   const string& target = entry.target;
   bool is_made = true;
   switch (entry.type) {
     case kind::directory:
-      is_made = mkdirat(directory->get(), name.c_str(), open_to_all) == 0;
+      is_made = mkdirat(opened, name.c_str(), open_to_all) == 0;
       break;
     case kind::file:
-      unpack_file(archive, entry, directory->get(), name);
+      unpack_file(archive, entry, directory, name);
       break;
     case kind::hard_link: {
-      const auto other = open_steps(root, get_directory(target));
-      is_made =
-          linkat(other->get(), get_name(target).c_str(), directory->get(), name.c_str(), 0) == 0;
+      const olm_directory other = open_steps(top, get_directory(target));
+      is_made = linkat(other.opened.get(), get_name(target).c_str(), opened, name.c_str(), 0) == 0;
       break;
     }
     case kind::symbolic_link:
-      is_made = symlinkat(target.c_str(), directory->get(), name.c_str()) == 0;
+      is_made = symlinkat(target.c_str(), opened, name.c_str()) == 0;
   }
-  if (!is_made) fail(path);
+  if (!is_made) fail(directory.path + '/' + name);
 }
 
 }  // namespace
@@ -205,7 +208,7 @@ olm_contents read_archive(int archive) {
   return contents;
 }
 
-void unpack(int archive, const olm_contents& contents, int directory) {
+void unpack(int archive, const olm_contents& contents, const olm_directory& directory) {
   // Names are in order, so that a directory stands before what is in it. What links lead to comes
   // before them, and nothing is written any more when there are symbolic ones.
   for (const kind type : {kind::directory, kind::file, kind::hard_link, kind::symbolic_link}) {

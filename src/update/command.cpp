@@ -8,6 +8,8 @@
 #include <algorithm>
 #include <array>
 #include <cstdio>
+#include <cstdlib>
+#include <filesystem>
 #include <memory>
 #include <sstream>
 
@@ -22,9 +24,21 @@ struct actions_destroyer {
   }
 };
 
+// Empty where no directory in PATH has it.
+std::string find_program(const std::string& name) {
+  std::istringstream path(getenv("PATH"));
+  for (std::string directory; std::getline(path, directory, ':');) {
+    std::string program = directory + '/' + name;
+    if (std::filesystem::exists(program)) return program;
+  }
+  return {};
+}
+
 }  // namespace
 
 std::optional<command_result> run_command(std::vector<std::string> words, int input) {
+  const std::string program = find_program(words[0]);
+  if (program.empty()) return {};
   std::array<int, 2> ends{};
   if (pipe2(ends.data(), O_CLOEXEC) != 0) fail(words[0]);
   const olm_descriptor reader(ends[0]);
@@ -39,15 +53,16 @@ std::optional<command_result> run_command(std::vector<std::string> words, int in
   std::transform(words.begin(), words.end(), arguments.begin(),
                  [](std::string& word) { return word.data(); });
   pid_t process = 0;
-  errno = posix_spawnp(&process, arguments[0], &actions, nullptr, arguments.data(), environ);
-  if (errno == ENOENT) return {};
+  errno = posix_spawn(&process, program.c_str(), &actions, nullptr, arguments.data(), environ);
   if (errno != 0) fail(words[0]);
   static_cast<void>(writer.close());
 
   std::string output;
   std::array<char, BUFSIZ> part{};
-  for (ssize_t length = 0; (length = read(reader.get(), part.data(), part.size())) > 0;)
+  ssize_t length = 0;
+  while ((length = read(reader.get(), part.data(), part.size())) > 0)
     output.append(part.data(), static_cast<std::size_t>(length));
+  if (length < 0) fail(words[0]);
   command_result result;
   std::istringstream all(output);
   for (std::string line; std::getline(all, line);) result.lines.push_back(line);

@@ -29,7 +29,7 @@ class olm_contents {
 
  private:
   [[nodiscard]] bool has(const std::string& name, update_entry::kind type) const;
-  [[nodiscard]] bool leads_within(const std::string& name, std::string target) const;
+  [[nodiscard]] bool leads_within(std::string name) const;
 
   std::map<std::string, update_entry> entries_;
 };

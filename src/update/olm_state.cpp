@@ -33,7 +33,7 @@ void sync_directory(const olm_descriptor& directory, const char* path) {
 }  // namespace
 
 void sync_all(const string& directory) {
-  if (syncfs(open_directory(directory).get()) != 0) fail(directory);
+  if (syncfs(open_top(directory).opened.get()) != 0) fail(directory);
 }
 
 olm_state::olm_state()
@@ -53,10 +53,10 @@ olm_state::~olm_state() {
   filesystem::remove(new_link, failure);
 }
 
-olm_descriptor make_part() {
+olm_directory make_part() {
   constexpr mode_t open_to_all = 0755;
   if (mkdir(part_directory, open_to_all) != 0) fail(part_directory);
-  return open_directory(part_directory);
+  return open_top(part_directory);
 }
 
 void put_in_place(const string& update) {

@@ -3,6 +3,7 @@
 #include <string>
 
 #include "fs/olm_descriptor.h"
+#include "update/steps.h"
 
 // What taking an update changes on the device, by one process at a time: each link in one step, and
 // each directory in one step under its own name. Until then they stand under other names. What is
@@ -35,7 +36,7 @@ class olm_state {
 inline constexpr const char* part_directory = "/var/db/timezone/tz/.part";
 
 // Makes that directory, which is empty then.
-[[nodiscard]] olm_descriptor make_part();
+[[nodiscard]] olm_directory make_part();
 
 // Gives that directory its name, `update`.
 void put_in_place(const std::string& update);

@@ -5,21 +5,38 @@
 #include "fs/file_operations.h"
 #include "update/failure.h"
 
-olm_descriptor open_entry(int directory, const std::string& name, int flags) {
+namespace {
+
+constexpr int directory_flags = O_RDONLY | O_DIRECTORY;
+
+olm_descriptor open_no_link(int directory, const std::string& name, int flags,
+                            const std::string& path) {
   constexpr mode_t readable = 0644;
   constexpr int always = O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
   const int opened = openat(directory, name.c_str(), flags | always, readable);
-  if (opened == -1) fail(name);
+  if (opened == -1) fail(path);
   return olm_descriptor(opened);
 }
 
-std::unique_ptr<olm_descriptor> open_steps(int directory, const std::string& path) {
-  constexpr int flags = O_RDONLY | O_DIRECTORY;
-  auto opened = std::make_unique<olm_descriptor>(open_entry(directory, ".", flags).release());
+}  // namespace
+
+olm_directory open_top(const std::string& path) {
+  return {open_no_link(AT_FDCWD, path, directory_flags, path), path};
+}
+
+olm_descriptor open_entry(const olm_directory& directory, const std::string& name, int flags) {
+  return open_no_link(directory.opened.get(), name, flags, directory.path + '/' + name);
+}
+
+olm_directory open_steps(const olm_directory& top, const std::string& path) {
+  olm_directory reached = {open_no_link(top.opened.get(), ".", directory_flags, top.path),
+                           top.path};
   std::string rest = path;
-  for (std::string name = fs::take_name(rest); !name.empty(); name = fs::take_name(rest))
-    opened = std::make_unique<olm_descriptor>(open_entry(opened->get(), name, flags).release());
-  return opened;
+  for (std::string name = fs::take_name(rest); !name.empty(); name = fs::take_name(rest)) {
+    reached.opened = open_entry(reached, name, directory_flags);
+    reached.path += '/' + name;
+  }
+  return reached;
 }
 
 std::string get_directory(const std::string& name) {

@@ -74,15 +74,11 @@ string read_mark(const string& update) {
   return is_there ? read_sum(path) : "";
 }
 
-void write_mark(int directory, const string& sum) {
-  constexpr mode_t readable = 0644;
-  const string path = string(part_directory) + '/' + mark_name;
-  olm_descriptor file(
-      openat(directory, mark_name, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, readable));
-  if (!file.is_open() ||
-      write(file.get(), sum.data(), sum.size()) != static_cast<ssize_t>(sum.size()) ||
+void write_mark(const olm_directory& directory, const string& sum) {
+  olm_descriptor file = open_entry(directory, mark_name, O_WRONLY | O_CREAT | O_EXCL);
+  if (write(file.get(), sum.data(), sum.size()) != static_cast<ssize_t>(sum.size()) ||
       file.close() != 0)
-    fail(path);
+    fail(directory.path + '/' + mark_name);
 }
 
 string describe_end(const command_result& result) {
@@ -205,10 +201,12 @@ string switch_to(const olm_state& state, const string& update, const string& pla
 // The paths of what can be gone back to, the newest first, and last the system partition's, which
 // is empty.
 std::vector<string> list_before(const device_facts& facts) {
+  // What is in use may be damaged, but its name is known.
+  const auto weighed = read_version(get_name(facts.weighed.path));
   std::vector<std::pair<olm_version, string>> updates;
   for (const update_facts& update : facts.updates) {
     const auto version = read_version(update.name);
-    if (version && facts.weighed.data->version > *version)
+    if (version && weighed && *weighed > *version)
       updates.emplace_back(*version, update_area + update.name);
   }
   std::sort(updates.begin(), updates.end(),
@@ -236,9 +234,9 @@ string take_archive(const string& archive, bool allows_older) {
       throw olm_refusal({update + " is there already, and was not made from this archive"});
     return switch_to(state, update, update, allows_older);
   }
-  const olm_descriptor part = make_part();
-  unpack(file.get(), contents, part.get());
-  write_mark(part.get(), sum);
+  const olm_directory part = make_part();
+  unpack(file.get(), contents, part);
+  write_mark(part, sum);
   return switch_to(state, update, part_directory, allows_older);
 }
 
@@ -250,7 +248,7 @@ string take_directory(const string& directory, bool allows_older) {
       filesystem::is_symlink(path))
     throw std::runtime_error(directory + ": is no directory right below " + update_area);
   const string update = require_version(path.filename());
-  static_cast<void>(adopt(update));
+  adopt(update);
   return switch_to(state, update, update, allows_older);
 }
 
