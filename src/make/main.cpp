@@ -118,13 +118,13 @@ void write_half(const string& marked, const string& zoneinfo, const string& outp
 }  // namespace
 
 int main(int count, char* arguments[]) {
-  std::vector<string> paths;
-  for (const char* const argument :
-       std::span(arguments, static_cast<std::size_t>(count)).subspan(1))
-    paths.push_back(std::filesystem::absolute(argument));
-  if (paths.size() < 3 || paths.size() > 4)
+  if (count < 4 || count > 5)
     errx(EXIT_FAILURE, "usage: tzdata-write-icu MARKED ZONEINFO OUTPUT [BASE]");
   try {
+    std::vector<string> paths;
+    for (const char* const argument :
+         std::span(arguments, static_cast<std::size_t>(count)).subspan(1))
+      paths.push_back(std::filesystem::absolute(argument));
     if (paths.size() > 3) take_base_from(paths[3]);
     write_half(paths[0], paths[1], paths[2]);
   } catch (const std::exception& failure) {
