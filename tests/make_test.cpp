@@ -347,4 +347,71 @@ TEST(make_test, believes_no_files) {
   }
 }
 
+// --- tzdata-image ---
+
+const string image = place + "image";
+const string archive_of_image = made + "2030c.1.0.tar";
+
+report make_image(const report& arguments) {
+  return hear(report{PROGRAMS "/tzdata-image"} + arguments + report{image, archive_of_image});
+}
+
+report list_image() { return hear({"find", image, "-printf", "%P %y %l %s\n"}); }
+
+class make_image_test : public testing::Test {
+ protected:
+  void SetUp() override {
+    run(release + "echo Link Test/Set_Back Test/Link >backward");
+    ASSERT_EQ(make({place + "release"}), tell_success("2030c.1.0"));
+    run("mkdir original; cd original; mkdir -p etc var usr/share/zoneinfo usr/lib/systemd/system\n"
+        "mkdir usr/share/tzdata-select; cp " DATA_SET
+        "/../../install/environment usr/share/tzdata-select\n"
+        "for unit in select zone-name; do : >usr/lib/systemd/system/tzdata-$unit.service; done\n"
+        "ln -s ../usr/share/zoneinfo/Test/Set_Back etc/localtime; : >usr/lib/libicudata.so.72");
+  }
+  static void lay_out_image(const string& prepare) {
+    run("rm -rf image; cp -a original image; " + prepare);
+  }
+};
+
+TEST_F(make_image_test, is_ready_after_one_run) {
+  // The image's own zone counts, and what a run that was killed has set aside.
+  lay_out_image("mv image/usr/share/zoneinfo image/usr/share/zoneinfo.old");
+  EXPECT_EQ(make_image({"--directory"}).back(), "exit 0");
+  run("[ ! -L image/usr/share/zoneinfo ] && [ -d image/usr/share/zoneinfo ]");
+  run("[ $(readlink image/var/db/timezone/localtime) = /var/db/timezone/zoneinfo/Test/Set_Back ]");
+  EXPECT_EQ(make_image({"--directory"}), report{"exit 0"});
+  EXPECT_EQ(make_image({"--zone=Test/Link"}),
+            (report{"/var/db/timezone/localtime -> /var/db/timezone/zoneinfo/Test/Link",
+                    "/usr/share/zoneinfo -> /var/db/timezone/zoneinfo", "exit 0"}));
+}
+
+TEST_F(make_image_test, is_left_as_it_is_where_something_is_wrong) {
+  const string no_link = " is a directory, where a link belongs";
+  const string damaged =
+      archive_of_image + " is damaged: " + made + "2030c.1.0.sha256 has another sum";
+  const std::array<string, 3> rows[] = {
+      {"mkdir -p image/usr/share/icu/icudt72l", "", image + "/usr/share/icu/icudt72l" + no_link},
+      {"rm -r image/var", "", image + " is no system's root directory: it has no /var"},
+      {"ln -s /data image/var/db", "", image + "/var/db/timezone leads out of " + image},
+      {"ln -s /data image/etc/systemd", "",
+       image + "/etc/systemd/system/sysinit.target.wants leads out of " + image},
+      {"echo ICU_DATA=/x >image/etc/environment", "",
+       image + "/etc/environment has another value than this: ICU_DATA=/usr/share/icu"},
+      {"rm image/usr/lib/systemd/system/tzdata-select.service", "",
+       image + " has no package tzdata-select: no tzdata-select.service"},
+      {"true", "--zone=Test/Nowhere", "Test/Nowhere is no zone of " + archive_of_image},
+      {"true", "--zone=../Test/Link", "../Test/Link is no zone"},
+      {"echo >>made/2030c.1.0.tar", "", damaged},
+      {": >made/2030c.1.0.sha256", "", damaged},
+  };
+  for (const auto& [prepare, option, says] : rows) {
+    lay_out_image(prepare);
+    const report before = list_image();
+    const report said = make_image(option.empty() ? report{} : report{option});
+    EXPECT_EQ(report(said.end() - 2, said.end()), (report{"tzdata-image: " + says, "exit 1"}));
+    EXPECT_EQ(list_image(), before);
+  }
+}
+
 }  // namespace
