@@ -4,7 +4,8 @@
 // that stays as it was, for the reasons in there, and std::runtime_error or std::system_error where
 // a call fails. Killed at any moment, the device is as before, or as after; another call removes
 // what was left. `allows_older`: a newer update that waits may be replaced.
-// A warning where the update lacks the device's zone is all that they print.
+// All that they print are warnings, where the update lacks the device's zone, or one that is not
+// needed any more cannot be removed.
 #pragma once
 
 #include <string>
