@@ -9,6 +9,8 @@
 class olm_descriptor {
  public:
   explicit olm_descriptor(int descriptor) : descriptor_(descriptor) {}
+  olm_descriptor(const olm_descriptor&) = delete;
+  olm_descriptor& operator=(const olm_descriptor&) = delete;
   olm_descriptor(olm_descriptor&& other) noexcept : descriptor_(other.release()) {}
   olm_descriptor& operator=(olm_descriptor&& other) noexcept {
     std::swap(descriptor_, other.descriptor_);

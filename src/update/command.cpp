@@ -26,12 +26,14 @@ struct actions_destroyer {
 
 // Empty where no directory in PATH has it.
 std::string find_program(const std::string& name) {
-  std::istringstream path(getenv("PATH"));
-  for (std::string directory; std::getline(path, directory, ':');) {
-    std::string program = directory + '/' + name;
-    if (std::filesystem::exists(program)) return program;
+  const char* const path = getenv("PATH");
+  std::istringstream directories(path == nullptr ? "" : path);
+  std::string found;
+  for (std::string directory; found.empty() && std::getline(directories, directory, ':');) {
+    const auto program = std::filesystem::path(directory) / name;
+    if (std::filesystem::exists(program)) found = program;
   }
-  return {};
+  return found;
 }
 
 }  // namespace
