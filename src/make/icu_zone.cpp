@@ -41,20 +41,23 @@ std::vector<period> list_periods(const olm_zone_file& file, instant to) {
   return periods;
 }
 
-// By how much daylight saving time is behind the standard time `of` in a period beside it.
-std::int32_t find_setback(const local_time& of, const local_time& beside) {
-  const bool is_pair = !of.is_dst && beside.is_dst && of.name == beside.name;
-  return is_pair ? std::max(0, of.offset - beside.offset) : 0;
+// By how much daylight saving time is behind the standard time `of` in a period beside it, if there
+// is one.
+std::int32_t find_setback(const local_time& of, const std::vector<period>& periods,
+                          std::size_t beside) {
+  if (of.is_dst || beside >= periods.size()) return 0;
+  const local_time& time = periods[beside].time;
+  return time.is_dst && of.name == time.name ? std::max(0, of.offset - time.offset) : 0;
 }
 
+// To ICU, daylight saving time that is behind standard time is standard time, and what is between
+// two such periods is daylight saving time.
 icu_time split(const std::vector<period>& periods, std::size_t index) {
   const local_time& time = periods[index].time;
   std::int32_t standard = time.is_dst ? decode_mark(time.name) : time.offset;
-  if (standard > time.offset) standard = time.offset;
-  for (const std::size_t beside : {index + 1, index - 1}) {
-    if (beside >= periods.size() || standard < time.offset) continue;
-    standard -= find_setback(time, periods[beside].time);
-  }
+  standard = std::min(standard, time.offset);
+  standard -=
+      std::min(find_setback(time, periods, index - 1), find_setback(time, periods, index + 1));
   return {standard, time.offset - standard};
 }
 
@@ -188,11 +191,13 @@ std::int32_t decode_mark(const std::string& mark) {
 
 icu_zone make_icu_zone(const olm_zone_file& file) {
   const int rule_year = get_year(file.get_last_change()) + 1;
-  const auto periods = list_periods(file, find_begin(rule_year + years_of_cycle));
+  const instant end = find_begin(rule_year + years_of_cycle);
+  // A year more, for what a time is depends on the next one, too.
+  const auto periods = list_periods(file, find_begin(rule_year + years_of_cycle + 1));
   icu_zone zone;
   zone.first = split(periods, 0);
   icu_time last = zone.first;
-  for (std::size_t i = 1; i < periods.size(); ++i) {
+  for (std::size_t i = 1; i < periods.size() && periods[i].begin < end; ++i) {
     const icu_time time = split(periods, i);
     if (time != last) zone.changes.push_back({periods[i].begin, last = time});
   }
