@@ -212,9 +212,9 @@ const string release = R"(rm -rf release && mkdir release && cd release && echo 
     Rule A 2020 max - Mar lastSun 1:00u 0 -
     Zone Test/Set_Back 1:00 - WET 2020 Mar lastSun 1:00u
      1:00 A WET/WEST" >northamerica
-  echo '{ sub(/max - Oct lastSun 1:00u -1:00 S/, "max - Oct lastSun 1:00u 0 -")
+  echo 'DATAFORM == "rearguard" { sub(/max - Oct lastSun 1:00u -1:00 S/, "max - Oct lastSun 1:00u 0 -")
     sub(/max - Mar lastSun 1:00u 0 -/, "max - Mar lastSun 1:00u 1:00 S")
-    sub(/^ *1:00 A WET.WEST/, "0:00 A WET/WEST"); print }' >ziguard.awk; )";
+    sub(/^ *1:00 A WET.WEST/, "0:00 A WET/WEST") } { print }' >ziguard.awk; )";
 
 struct run_row {
   string prepare;  // a command, in the directory of the release
@@ -234,6 +234,11 @@ TEST(make_test, takes_a_release_or_says_why_not) {
        {"--number=20301124.10", archive},
        tell_success("2030c.20301124.10"),
        "cmp made/2030c.20301124.10.tar first/2030c.1.0.tar"},
+      // Without ziguard.awk, what counts as daylight saving time is another.
+      {"tar -xf ../first/2030c.1.0.tar zoneinfo icutz",
+       {place + "release/zoneinfo/tzdata.zi"},
+       tell_success("2030c.1.0"),
+       "tar -xf made/*.tar icutz && ! cmp icutz/zoneinfo64.res release/icutz/zoneinfo64.res"},
       {"cd ..; tar --create --gzip --file=release.tar.gz release",
        {archive},
        tell_success("2030c.1.0"),
@@ -293,9 +298,6 @@ TEST(make_test, takes_a_release_or_says_why_not) {
        "diff made first"},
       {"tar -xf ../first/2030c.1.0.tar icutz; truncate -s 999 icutz/metaZones.res",
        {"--base=" + place + "release/icutz", place + "release"},
-       program + "ICU's files cannot be made, exit 1"},
-      {"true",
-       {"--base=" + place + "nothing", place + "release"},
        program + "ICU's files cannot be made, exit 1"},
       {"true",
        {"--number=01.0", archive},
