@@ -425,9 +425,9 @@ TEST_F(update_on_device, asks_the_checker) {
   lay_out(on_first);
   publish(published, good + tar_end);
   const device before = look();
-  make_program("tzdata-check", "echo one; echo $1 $PATH >&2; exit 1");
+  make_program("tzdata-check", "echo one; echo $1 $PATH $STRAY >&2; exit 1");
   EXPECT_EQ(
-      hear({"env", "PATH=/nowhere", PROGRAMS "/tzdata-update", archive.front()}),
+      hear({"env", "PATH=/nowhere", "STRAY=x", PROGRAMS "/tzdata-update", archive.front()}),
       (report{"one", updates + ".part /usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin",
               "exit 1"}));
   make_program("tzdata-check", "echo lost >&2; exit 2");
