@@ -253,7 +253,10 @@ const std::vector<device_update> device_updates = {
      {third},
      {"zoneinfo/x has another name outside the update", "exit 1"},
      {},
-     [] { files::create_hard_link(base + "other", third + "/zoneinfo/x"); }},
+     [] {
+       files::permissions(base + "other", files::perms(0600));
+       files::create_hard_link(base + "other", third + "/zoneinfo/x");
+     }},
     {on_first + folder(updates + "part"),
      {updates + "part"},
      {"part is no version such as 2026a.1.0", "exit 1"}},

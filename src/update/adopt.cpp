@@ -57,9 +57,13 @@ std::vector<string> list_names(const olm_directory& directory) {
 // The files of an update, by what they are on the disk.
 struct update_file {
   nlink_t names = 0;          // in all directories
+  bool is_ready = false;      // its owner and mode need no change
   std::vector<string> paths;  // in the update
 };
 using update_files = std::map<std::pair<dev_t, ino_t>, update_file>;
+
+constexpr mode_t all_bits = 07777;
+constexpr mode_t readable = 0644;
 
 // Gives what the entry `name` is, whose path in the update is `path`. A file is noted in `files`.
 update_entry adopt_entry(const olm_directory& directory, const string& name, const string& path,
@@ -72,6 +76,8 @@ update_entry adopt_entry(const olm_directory& directory, const string& name, con
   if (S_ISREG(status.st_mode)) {
     update_file& file = files[{status.st_dev, status.st_ino}];
     file.names = status.st_nlink;
+    file.is_ready =
+        status.st_uid == 0 && status.st_gid == 0 && (status.st_mode & all_bits) == readable;
     file.paths.push_back(path);
     return {.type = kind::file};
   }
@@ -80,10 +86,11 @@ update_entry adopt_entry(const olm_directory& directory, const string& name, con
   return {.type = kind::symbolic_link, .target = read_target(opened, name, whole_path)};
 }
 
-// Changes no file that also stands elsewhere.
+// Some programs link what did not change to the update before. But no file that stands elsewhere is
+// changed.
 void adopt_files(const olm_directory& top, const update_files& files) {
-  constexpr mode_t readable = 0644;
   for (const auto& [id, file] : files) {
+    if (file.is_ready) continue;
     const string& path = file.paths.front();
     if (file.names != file.paths.size())
       throw olm_refusal({path + " has another name outside the update"});
