@@ -430,7 +430,7 @@ TEST_F(update_on_device, asks_the_checker) {
   const device before = look();
   make_program("tzdata-check", "echo one; echo $1 $PATH $STRAY >&2; exit 1");
   EXPECT_EQ(
-      hear({"env", "PATH=/nowhere", "STRAY=x", PROGRAMS "/tzdata-update", archive.front()}),
+      hear(report{"env", "PATH=/nowhere", "STRAY=x", PROGRAMS "/tzdata-update"} + archive),
       (report{"one", updates + ".part /usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin",
               "exit 1"}));
   make_program("tzdata-check", "echo lost >&2; exit 2");
