@@ -102,8 +102,8 @@ void keep_zone() {
 
 void remove_spare(const char* link) { device::remove(fs::get_spare_path(link).c_str()); }
 
-// Gives a link back what it held before the start that was killed, or what an update is to be gone
-// back to.
+// Makes a link lead where its spare does: where it led before the start that was killed, or where
+// whoever goes back from an update wants it.
 void restore(const char* link) {
   const std::string spare = fs::get_spare_path(link);
   const std::string target = fs::peek_symlink(spare);
